@@ -1,0 +1,88 @@
+// Time as the hub client library sees it: every steady time, timed wait and sleep of a run comes from the
+// one Clock that belongs to its connection. Real time for a real hub (RealClock), simulated time for a hub
+// in this process (transport/EmbeddedHub.h).
+#pragma once
+
+#include <chrono>
+#include <condition_variable>
+#include <mutex>
+
+namespace ssc {
+
+class Clock;
+
+/// A condition variable whose waits take their time from a Clock. Used with a std::mutex, like the standard one.
+class Condition {
+ public:
+  explicit Condition(Clock& clock) : clock_(clock) {}
+  Condition(const Condition&) = delete;
+  Condition& operator=(const Condition&) = delete;
+
+  /// Wakes every thread that waits now.
+  void notify_all();
+
+ private:
+  friend class RealClock;
+  Clock& clock_;
+  std::condition_variable native_;
+};
+
+class Clock {
+ public:
+  using Duration = std::chrono::nanoseconds;
+  /// Steady time since an arbitrary start.
+  using TimePoint = std::chrono::time_point<Clock, Duration>;
+
+  virtual ~Clock() = default;
+
+  [[nodiscard]] virtual TimePoint now() const = 0;
+
+  /// Releases `lock`, waits until `condition` is notified or `timeout` has passed, and takes it again.
+  /// One wait: it may also return early for no reason.
+  virtual void wait(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) = 0;
+
+  virtual void notifyAll(Condition& condition) = 0;
+
+  virtual void sleepFor(Duration duration) = 0;
+
+  // What the connection's event thread asks. In real time events happen by themselves; in simulated time they
+  // happen while a thread waits, and the event thread is what makes them happen.
+
+  /// Event thread: returns when events may happen (real time: at once), or after stopWaiting().
+  virtual void awaitIdle() {}
+  /// Event thread: the time up to which events may happen now.
+  [[nodiscard]] virtual TimePoint horizon() const { return TimePoint::max(); }
+  /// Event thread: nothing more happens up to the horizon.
+  virtual void horizonReached() {}
+  /// Any thread: ends awaitIdle() for good.
+  virtual void stopWaiting() {}
+};
+
+class RealClock final : public Clock {
+ public:
+  [[nodiscard]] TimePoint now() const override;
+  void wait(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) override;
+  void notifyAll(Condition& condition) override;
+  void sleepFor(Duration duration) override;
+};
+
+/// `time` + `duration`, or the largest time when that would overflow. `duration` >= 0.
+template <class TimePoint>
+constexpr TimePoint saturatingAdd(TimePoint time, typename TimePoint::duration duration) {
+  if (duration > TimePoint::max() - time) return TimePoint::max();
+  return time + duration;
+}
+
+/// Any duration in nanoseconds; what does not fit becomes the nearest end of the range, a
+/// not-a-number duration 0.
+template <class Rep, class Period>
+constexpr Clock::Duration saturatingNanoseconds(const std::chrono::duration<Rep, Period>& duration) {
+  using LongSeconds = std::chrono::duration<long double>;
+  const long double seconds = std::chrono::duration_cast<LongSeconds>(duration).count();
+  if (!(seconds == seconds)) return Clock::Duration::zero();
+  if (seconds >= std::chrono::duration_cast<LongSeconds>(Clock::Duration::max()).count()) return Clock::Duration::max();
+  if (seconds <= std::chrono::duration_cast<LongSeconds>(Clock::Duration::min()).count()) return Clock::Duration::min();
+  return std::chrono::duration_cast<Clock::Duration>(duration);
+}
+
+}  // namespace ssc

@@ -1,0 +1,119 @@
+#include "ssc/transport/EmbeddedHub.h"
+
+#include <algorithm>
+#include <utility>
+
+namespace ssc {
+
+SharedEmbeddedHub::SharedEmbeddedHub(std::unique_ptr<EmbeddedHub> hub)
+    : hub_(std::move(hub)), now_(hub_->Now().time_since_epoch().count()) {}
+
+SharedEmbeddedHub::~SharedEmbeddedHub() = default;
+
+int SharedEmbeddedHub::Submit(qmi::Bytes datagram) {
+  const std::lock_guard<std::mutex> guard(mutex_);
+  return hub_->Submit(datagram);
+}
+
+bool SharedEmbeddedHub::RunUntil(Clock::TimePoint limit, Incoming* incoming) {
+  const std::lock_guard<std::mutex> guard(mutex_);
+  const bool came = hub_->RunUntil(std::max(limit, hub_->Now()), incoming);
+  now_ = hub_->Now().time_since_epoch().count();
+  return came;
+}
+
+void SimulatedClock::wait(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) {
+  {
+    std::unique_lock<std::mutex> clockLock(mutex_);
+    const auto waiter = waiters_.insert(
+        waiters_.end(), Waiter{&condition, saturatingAdd(now(), std::max(timeout, Duration::zero())),
+                               std::this_thread::get_id() == eventThread_});
+    lock.unlock();  // after the waiter stands in the list, so that no notification is lost
+    block(waiter, clockLock);
+  }
+  lock.lock();
+}
+
+void SimulatedClock::sleepFor(Duration duration) {
+  std::unique_lock<std::mutex> clockLock(mutex_);
+  const auto waiter =
+      waiters_.insert(waiters_.end(), Waiter{nullptr, saturatingAdd(now(), std::max(duration, Duration::zero())),
+                                             std::this_thread::get_id() == eventThread_});
+  block(waiter, clockLock);
+}
+
+void SimulatedClock::block(std::list<Waiter>::iterator waiter, std::unique_lock<std::mutex>& clockLock) {
+  changed_.notify_all();
+  changed_.wait(clockLock, [&] {
+    return (waiter->woken && (eventThreadAtRest_ || waiter->onEventThread)) || stopped_;
+  });
+  waiters_.erase(waiter);
+  changed_.notify_all();
+}
+
+void SimulatedClock::notifyAll(Condition& condition) {
+  const std::lock_guard<std::mutex> guard(mutex_);
+  for (Waiter& waiter : waiters_) {
+    if (waiter.condition == &condition) waiter.woken = true;
+  }
+  changed_.notify_all();
+}
+
+bool SimulatedClock::mayRunEvents() const {
+  return !waiters_.empty() &&
+         std::none_of(waiters_.begin(), waiters_.end(), [](const Waiter& waiter) { return waiter.woken; });
+}
+
+void SimulatedClock::awaitIdle() {
+  std::unique_lock<std::mutex> clockLock(mutex_);
+  eventThread_ = std::this_thread::get_id();
+  eventThreadAtRest_ = true;
+  changed_.notify_all();
+  changed_.wait(clockLock, [this] { return stopped_ || mayRunEvents(); });
+  eventThreadAtRest_ = stopped_;
+}
+
+Clock::TimePoint SimulatedClock::horizon() const {
+  const std::lock_guard<std::mutex> guard(mutex_);
+  TimePoint earliest = TimePoint::max();
+  for (const Waiter& waiter : waiters_) earliest = std::min(earliest, waiter.deadline);
+  return earliest;
+}
+
+void SimulatedClock::horizonReached() {
+  std::unique_lock<std::mutex> clockLock(mutex_);
+  const TimePoint time = now();
+  bool any = false;
+  for (Waiter& waiter : waiters_) {
+    if (waiter.deadline <= time) waiter.woken = any = true;
+  }
+  if (any) {
+    changed_.notify_all();
+    return;
+  }
+  // Nobody's deadline will ever come: only another thread can change anything.
+  const std::size_t waiting = waiters_.size();
+  eventThreadAtRest_ = true;
+  changed_.wait(clockLock, [&] { return stopped_ || waiters_.size() != waiting || !mayRunEvents(); });
+  eventThreadAtRest_ = false;
+}
+
+void SimulatedClock::stopWaiting() {
+  const std::lock_guard<std::mutex> guard(mutex_);
+  stopped_ = true;
+  changed_.notify_all();
+}
+
+Transport::Outcome EmbeddedTransport::Receive(Clock::TimePoint deadline, Incoming* incoming) {
+  return hub_->RunUntil(deadline, incoming) ? Outcome::kIncoming : Outcome::kTimedOut;
+}
+
+HubLink makeEmbeddedLink(std::unique_ptr<EmbeddedHub> hub) {
+  auto shared = std::make_shared<SharedEmbeddedHub>(std::move(hub));
+  HubLink link;
+  link.clock = std::make_unique<SimulatedClock>(shared);
+  link.transport = std::make_unique<EmbeddedTransport>(std::move(shared));
+  return link;
+}
+
+}  // namespace ssc
