@@ -132,7 +132,8 @@ std::optional<Request> decodeRequest(Bytes datagram) {
 
 std::optional<Response> decodeResponse(Bytes datagram) {
   const auto header = decodeHeader(datagram);
-  if (!header || header->kind != Kind::kResponse || header->messageId != kClientRequestId) return std::nullopt;
+  if (!header || header->kind != Kind::kResponse || header->messageId != kClientRequestId)
+    return std::nullopt;
   const auto result = findInteger<std::uint32_t>(header->tlvs, kTlvResponseResult);
   if (!result) return std::nullopt;
   return Response{header->transactionId, static_cast<std::uint16_t>(*result & 0xffff),

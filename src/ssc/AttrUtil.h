@@ -27,8 +27,8 @@ enum AttributeId : std::int32_t {
   kAttributeHardwareId = 29,  ///< provisional: not confirmed on a handset
 };
 
-/// Loads a sensor's attributes and reads them. The readers return 0, or kNoData when the attribute is absent or of
-/// another kind; `out` is set on success only.
+/// Loads a sensor's attributes and reads them. The readers return 0, or kNoData when the attribute is absent
+/// or of another kind; `out` is set on success only.
 class AttrUtil {
  public:
   explicit AttrUtil(Connection* connection) : exchange_(connection) {}

@@ -34,7 +34,9 @@ std::string Client::MakeConfigRequest(const SensorUid& suid, float rateHz, std::
   return encode(std::move(request), kStreamConfigRequest);
 }
 
-std::string Client::MakeDisableRequest(const SensorUid& suid) { return encode(MakeRequest(suid), kDisableRequest); }
+std::string Client::MakeDisableRequest(const SensorUid& suid) {
+  return encode(MakeRequest(suid), kDisableRequest);
+}
 
 std::string Client::MakeFactoryTestRequest(const SensorUid& suid) {
   sns_client_request_msg request = MakeRequest(suid);

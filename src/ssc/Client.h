@@ -27,14 +27,16 @@ class Client {
   virtual void OnEvent(const sns_client_event_msg& message) = 0;
   virtual void OnReconnect() {}   ///< the hub is back; it has forgotten every request
   virtual void OnDisconnect() {}  ///< the hub went away
-  /// A client that is still registered here is taken off, but its own handlers are gone by then: unregister before.
+  /// A client that is still registered here is taken off, but its own handlers are gone by then: unregister
+  /// before.
   virtual ~Client();
 
   /// A request to a sensor, complete but for msg_id and payload.
   [[nodiscard]] static sns_client_request_msg MakeRequest(const SensorUid& suid);
   /// An encoded request to stream at `rateHz`, or, when that is not above 0, to report on change. A batch
   /// period of 0 µs asks for no batching.
-  [[nodiscard]] static std::string MakeConfigRequest(const SensorUid& suid, float rateHz, std::uint32_t batchPeriodUs);
+  [[nodiscard]] static std::string MakeConfigRequest(const SensorUid& suid, float rateHz,
+                                                     std::uint32_t batchPeriodUs);
   [[nodiscard]] static std::string MakeDisableRequest(const SensorUid& suid);
   /// An encoded factory test, which also makes a sensor read its calibration again.
   [[nodiscard]] static std::string MakeFactoryTestRequest(const SensorUid& suid);
@@ -46,12 +48,13 @@ class Client {
   /// is returned. `responses` may be null.
   int SendRequests(const std::vector<std::string>& requests, std::vector<Response>* responses);
 
-  /// One episode: registers this client, sends the requests with its mutex held, waits once for a handler to notify
-  /// `condition` or for `timeout` to pass, unregisters. A failed send is the result; kTimedOut when at least
-  /// `timeout` has passed (at once for one that is not above 0); else `status`. There is one wait and no
-  /// predicate: a spurious wake-up ends the episode early with the status.
+  /// One episode: registers this client, sends the requests with its mutex held, waits once for a handler to
+  /// notify `condition` or for `timeout` to pass, unregisters. A failed send is the result; kTimedOut when at
+  /// least `timeout` has passed (at once for one that is not above 0); else `status`. There is one wait and
+  /// no predicate: a spurious wake-up ends the episode early with the status.
   template <class Rep, class Period>
-  int SendRequestsAndWait(const std::vector<std::string>& requests, const std::chrono::duration<Rep, Period>& timeout,
+  int SendRequestsAndWait(const std::vector<std::string>& requests,
+                          const std::chrono::duration<Rep, Period>& timeout,
                           std::vector<Response>* responses) {
     return sendRequestsAndWaitFor(requests, saturatingNanoseconds(timeout), responses);
   }

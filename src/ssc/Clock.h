@@ -11,7 +11,8 @@ namespace ssc {
 
 class Clock;
 
-/// A condition variable whose waits take their time from a Clock. Used with a std::mutex, like the standard one.
+/// A condition variable whose waits take their time from a Clock. Used with a std::mutex, like the standard
+/// one.
 class Condition {
  public:
   explicit Condition(Clock& clock) : clock_(clock) {}
@@ -80,8 +81,10 @@ constexpr Clock::Duration saturatingNanoseconds(const std::chrono::duration<Rep,
   using LongSeconds = std::chrono::duration<long double>;
   const long double seconds = std::chrono::duration_cast<LongSeconds>(duration).count();
   if (!(seconds == seconds)) return Clock::Duration::zero();
-  if (seconds >= std::chrono::duration_cast<LongSeconds>(Clock::Duration::max()).count()) return Clock::Duration::max();
-  if (seconds <= std::chrono::duration_cast<LongSeconds>(Clock::Duration::min()).count()) return Clock::Duration::min();
+  if (seconds >= std::chrono::duration_cast<LongSeconds>(Clock::Duration::max()).count())
+    return Clock::Duration::max();
+  if (seconds <= std::chrono::duration_cast<LongSeconds>(Clock::Duration::min()).count())
+    return Clock::Duration::min();
   return std::chrono::duration_cast<Clock::Duration>(duration);
 }
 

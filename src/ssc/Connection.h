@@ -1,10 +1,11 @@
 // One connection to the hub, shared by any number of clients.
 //
-// Threads: the connection has one event thread, which calls the clients' handlers, one after the other, in the
-// order in which things came in. Taking datagrams off the wire is a role that one thread at a time has: the event
-// thread when it is idle, otherwise a thread that waits for the response to its request. So a response
-// never waits for a handler (which may itself be waiting for a mutex that the requesting thread holds), and a
-// handler may send requests itself. What comes in for clients meanwhile is kept in order for the event thread.
+// Threads: the connection has one event thread, which calls the clients' handlers, one after the other, in
+// the order in which things came in. Taking datagrams off the wire is a role that one thread at a time has:
+// the event thread when it is idle, otherwise a thread that waits for the response to its request. So a
+// response never waits for a handler (which may itself be waiting for a mutex that the requesting thread
+// holds), and a handler may send requests itself. What comes in for clients meanwhile is kept in order for
+// the event thread.
 //
 // Who gets an event: every client that was registered when the event came in, still is, and has ever sent a
 // request to the event's sensor.
@@ -35,8 +36,8 @@ class Connection {
   /// How long a request waits for its QMI response.
   static constexpr std::chrono::seconds kResponseTimeout{3};
 
-  /// Connects to the hub that the environment names; `embeddedHub` makes the hub of "sim" (a program without a
-  /// simulator passes none). 0, and the caller owns `*out`; or a negative result after a level-0 message.
+  /// Connects to the hub that the environment names; `embeddedHub` makes the hub of "sim" (a program without
+  /// a simulator passes none). 0, and the caller owns `*out`; or a negative result after a level-0 message.
   static int Create(Connection** out, const EmbeddedHubFactory& embeddedHub = nullptr);
 
   /// A connection over a link that is open already.
@@ -50,13 +51,14 @@ class Connection {
   /// Starts delivery to the client's handlers. Registering twice changes nothing.
   void RegisterClient(Client* client);
 
-  /// Ends delivery. On return no handler of the client is running, unless it is a handler that calls this. The
-  /// caller holds no mutex that the client's handlers take.
+  /// Ends delivery. On return no handler of the client is running, unless it is a handler that calls this.
+  /// The caller holds no mutex that the client's handlers take.
   void UnregisterClient(Client* client);
 
-  /// Sends an encoded sns_client_request_msg for `client` and waits for the QMI response. `response` may be null.
-  /// 0; kIoError when the hub refused; kTimedOut without a response in time; kNotConnected when the connection is
-  /// down or goes down meanwhile; kInvalid when the request does not parse or does not fit a datagram.
+  /// Sends an encoded sns_client_request_msg for `client` and waits for the QMI response. `response` may be
+  /// null. 0; kIoError when the hub refused; kTimedOut without a response in time; kNotConnected when the
+  /// connection is down or goes down meanwhile; kInvalid when the request does not parse or does not fit a
+  /// datagram.
   int SendRequest(Client* client, const std::string& request, Response* response);
 
   /// Forgets the client. To be called when it is destroyed; ends delivery as UnregisterClient does.
@@ -92,19 +94,22 @@ class Connection {
   explicit Connection(HubLink link);
 
   void runEventThread();
-  /// Takes one thing off the wire, waiting until `deadline`, and sorts it: responses to their requests, the rest
-  /// into `queue_`. The calling thread has no other claim on the reader's role; `lock` is released while it waits.
-  void readOne(Lock& lock, Clock::TimePoint deadline, Incoming* incoming);
+  /// Takes the reader's role, which must be free, and takes one thing off the wire, waiting until `deadline`:
+  /// responses go to their requests, the rest into `queue_`. `lock` is released meanwhile.
+  Transport::Outcome readOne(Lock& lock, Clock::TimePoint deadline, Incoming* incoming);
+  void waitForChange(Lock& lock, Clock::Duration timeout);
+  void announceChange();
   void sortIncoming(const Incoming& incoming);
-  void sortResponse(qmi::Bytes datagram);
-  void sortReport(qmi::Bytes datagram);
+  void sortResponse(const qmi::Response& response);
+  void sortReport(const qmi::Report& report);
   void dropMalformed(const char* what);
   void connectionChanged(Incoming::Kind kind);
+  [[nodiscard]] std::unique_ptr<Delivery> takeSpare();
   /// Calls the handlers of the queue's first delivery.
   void deliverNext(Lock& lock);
   [[nodiscard]] bool stillRegistered(const Recipient& recipient) const;
   [[nodiscard]] std::uint16_t nextTransaction();
-  int awaitResponse(Lock& lock, PendingRequest& pending);
+  int awaitResponse(Lock& lock, const PendingRequest& pending);
 
   const std::unique_ptr<Clock> clock_;
   const std::unique_ptr<Transport> transport_;
@@ -114,15 +119,15 @@ class Connection {
   bool stopping_ = false;
   bool up_ = true;
   bool reading_ = false;  ///< a thread has the reader's role
-  bool eventThreadWaits_ = false;
+  int waiting_ = 0;       ///< threads that wait for `changed_`
   std::uint16_t lastTransaction_ = 0;
   std::uint64_t lastRegistration_ = 0;
   std::uint64_t malformed_ = 0;
   std::map<Client*, ClientState> clients_;
   std::map<std::uint16_t, PendingRequest*> pending_;
-  std::deque<Delivery> queue_;
-  std::vector<Delivery> spare_;  ///< used deliveries, kept for their buffers
-  Client* handling_ = nullptr;   ///< whose handler runs
+  std::deque<std::unique_ptr<Delivery>> queue_;
+  std::vector<std::unique_ptr<Delivery>> spare_;  ///< used deliveries, kept for their buffers
+  Client* handling_ = nullptr;                    ///< whose handler runs
 
   std::thread eventThread_;
 };

@@ -8,7 +8,8 @@ std::string devicePath(const std::string& path) {
 #ifdef VANTLE_HANDSET
   return path;
 #else
-  const char* root = std::getenv("VANTLE_ROOT");  // NOLINT: the environment is only changed before threads exist
+  const char* root =
+      std::getenv("VANTLE_ROOT");  // NOLINT: the environment is only changed before threads exist
   return (root != nullptr && *root != '\0') ? std::string(root) + path : path;
 #endif
 }

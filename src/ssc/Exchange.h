@@ -21,8 +21,8 @@ class Exchange final : public Client {
   using Matcher = std::function<std::optional<int>(const Event&)>;
 
   /// Sends `request` to `suid` and waits for the event that `matcher` takes. The matcher runs on the event
-  /// thread. The matcher's result; kTimedOut when no answer came within 3 s; kNotConnected when the hub went away
-  /// meanwhile; or what sending returned.
+  /// thread. The matcher's result; kTimedOut when no answer came within 3 s; kNotConnected when the hub went
+  /// away meanwhile; or what sending returned.
   int Run(const SensorUid& suid, const sns_client_request_msg& request, Matcher matcher);
 
   void OnEvent(const sns_client_event_msg& message) override;

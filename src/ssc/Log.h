@@ -7,9 +7,9 @@
 
 namespace ssc {
 
-inline constexpr int kLogError = 0;    ///< always shown, on standard error
-inline constexpr int kLogWarn = 1;     ///< this and the following on standard output
-inline constexpr int kLogInfo = 2;     ///< the default level
+inline constexpr int kLogError = 0;  ///< always shown, on standard error
+inline constexpr int kLogWarn = 1;   ///< this and the following on standard output
+inline constexpr int kLogInfo = 2;   ///< the default level
 inline constexpr int kLogDebug = 3;
 inline constexpr int kLogVerbose = 4;
 

@@ -19,12 +19,13 @@ class RegistryUtil {
   /// The folder of the registry's files on the handset, with the closing slash. A file is named as its group.
   [[nodiscard]] static std::string RegistryPath();
 
-  /// Fills `out` with the group's items, its subgroups filled in. 0; kNotFound when there is no such group (with a
-  /// level-0 message); kTimedOut; kMalformed; or what sending returned.
+  /// Fills `out` with the group's items, its subgroups filled in. 0; kNotFound when there is no such group
+  /// (with a level-0 message); kTimedOut; kMalformed; or what sending returned.
   int Read(const std::string& group, sns_registry_data* out);
 
-  /// Writes the items; the hub keeps those that are not named. With `group2` and `data2` a second group is written
-  /// after the first. 0; kIoError when the hub could not write; kTimedOut; kMalformed; or what sending returned.
+  /// Writes the items; the hub keeps those that are not named. With `group2` and `data2` a second group is
+  /// written after the first. 0; kIoError when the hub could not write; kTimedOut; kMalformed; or what
+  /// sending returned.
   int Write(const std::string& group, const sns_registry_data& data, const std::string* group2 = nullptr,
             const sns_registry_data* data2 = nullptr);
 
@@ -37,17 +38,19 @@ class RegistryUtil {
   /// for), its version one more than it was, or 1 when it had none.
   static sns_registry_data_item* GetIncrementedDataItem(const std::string& name, sns_registry_data* data);
 
-  /// Makes `subgroup` hold exactly the float items "x", "y", "z", as many as there are values (one to three; more
-  /// are ignored). An item that was there keeps its place in the version count: each version is one more than it was.
+  /// Makes `subgroup` hold exactly the float items "x", "y", "z", as many as there are values (one to three;
+  /// more are ignored). An item that was there keeps its place in the version count: each version is one more
+  /// than it was.
   static void CreateRegistryVector(const std::vector<float>& values, sns_registry_data* subgroup);
   /// The floats of the subgroup in its order; an item of another kind counts as 0.
   [[nodiscard]] static std::vector<float> GetRegistryVector(const sns_registry_data& subgroup);
 
   /// Makes `subgroup` hold exactly the float items "0_0" … "2_2" of a 3×3 matrix: from nine values in row
-  /// order, or from three for the diagonal (zeros elsewhere). Another number of values leaves it alone. Versions
-  /// as for a vector.
+  /// order, or from three for the diagonal (zeros elsewhere). Another number of values leaves it alone.
+  /// Versions as for a vector.
   static void CreateRegistryMatrix(const std::vector<float>& values, sns_registry_data* subgroup);
-  /// The diagonal's three values, or all nine in row order, looked up by name; empty when one is missing or is no float.
+  /// The diagonal's three values, or all nine in row order, looked up by name; empty when one is missing or
+  /// is no float.
   [[nodiscard]] static std::vector<float> GetRegistryMatrix(const sns_registry_data& subgroup, bool diagonal);
 
  private:

@@ -13,8 +13,8 @@ class SuidUtil {
  public:
   explicit SuidUtil(Connection* connection) : exchange_(connection) {}
 
-  /// Every SUID that publishes `dataType`, in the hub's order. 0; kNotFound when nobody publishes it; kTimedOut
-  /// without an answer; or what sending returned.
+  /// Every SUID that publishes `dataType`, in the hub's order. 0; kNotFound when nobody publishes it;
+  /// kTimedOut without an answer; or what sending returned.
   int Lookup(const std::string& dataType, std::vector<SensorUid>* suids);
 
  private:

@@ -1,8 +1,8 @@
 #include "qmi/Qmi.h"
 
-#include <gtest/gtest.h>
-
 #include <string>
+
+#include <gtest/gtest.h>
 
 namespace {
 
@@ -11,9 +11,9 @@ std::vector<std::uint8_t> bytes(const std::string& text) { return {text.begin(),
 TEST(Qmi, RequestHasTheDocumentedBytes) {
   std::vector<std::uint8_t> datagram;
   ASSERT_TRUE(qmi::encodeRequest(0x0102, bytes("ab"), &datagram));
-  EXPECT_EQ(datagram, (std::vector<std::uint8_t>{0, 0x02, 0x01, 0x20, 0x00, 11, 0,      // header
-                                                 0x01, 4, 0, 2, 0, 'a', 'b',            // payload
-                                                 0x10, 1, 0, 1}));                      // large reports accepted
+  EXPECT_EQ(datagram, (std::vector<std::uint8_t>{0, 0x02, 0x01, 0x20, 0x00, 11, 0,  // header
+                                                 0x01, 4, 0, 2, 0, 'a', 'b',        // payload
+                                                 0x10, 1, 0, 1}));                  // large reports accepted
 }
 
 TEST(Qmi, RequestSurvivesTheRoundTrip) {

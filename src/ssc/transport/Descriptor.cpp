@@ -1,12 +1,12 @@
 #include "ssc/transport/Descriptor.h"
 
-#include <poll.h>
-#include <sys/eventfd.h>
-
 #include <algorithm>
 #include <array>
 #include <cstdint>
 #include <ctime>
+
+#include <poll.h>
+#include <sys/eventfd.h>
 
 namespace ssc {
 namespace {
@@ -36,7 +36,7 @@ Interrupter::Woken Interrupter::WaitReadable(int fd, Clock::TimePoint deadline) 
     std::timespec timeout{};
     const int ready = ::ppoll(polled.data(), polled.size(), remaining(deadline, &timeout), nullptr);
     if (ready < 0) continue;  // a signal
-    if (ready == 0) return Woken::kTimedOut;
+    if (ready == 0) return Woken::kDeadline;
     if ((polled[0].revents & POLLIN) != 0) {
       std::uint64_t count = 0;
       [[maybe_unused]] const auto got = ::read(event_.get(), &count, sizeof count);

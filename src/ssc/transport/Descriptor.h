@@ -1,8 +1,8 @@
 #pragma once
 
-#include <unistd.h>
-
 #include <utility>
+
+#include <unistd.h>
 
 #include "ssc/Clock.h"
 
@@ -41,9 +41,9 @@ class Interrupter {
 
   void Signal();
 
-  enum class Woken { kReady, kTimedOut, kInterrupted };
-  /// Waits until `fd` (ignored when negative) can be read, `deadline` passes on the steady clock, or Signal was
-  /// called. One Signal ends one wait.
+  enum class Woken { kReady, kDeadline, kInterrupted };
+  /// Waits until `fd` (ignored when negative) can be read, `deadline` passes on the steady clock, or Signal
+  /// was called. One Signal ends one wait.
   [[nodiscard]] Woken WaitReadable(int fd, Clock::TimePoint deadline);
 
  private:

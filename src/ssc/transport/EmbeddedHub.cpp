@@ -36,17 +36,16 @@ void SimulatedClock::wait(Condition& condition, std::unique_lock<std::mutex>& lo
 
 void SimulatedClock::sleepFor(Duration duration) {
   std::unique_lock<std::mutex> clockLock(mutex_);
-  const auto waiter =
-      waiters_.insert(waiters_.end(), Waiter{nullptr, saturatingAdd(now(), std::max(duration, Duration::zero())),
-                                             std::this_thread::get_id() == eventThread_});
+  const auto waiter = waiters_.insert(
+      waiters_.end(), Waiter{nullptr, saturatingAdd(now(), std::max(duration, Duration::zero())),
+                             std::this_thread::get_id() == eventThread_});
   block(waiter, clockLock);
 }
 
 void SimulatedClock::block(std::list<Waiter>::iterator waiter, std::unique_lock<std::mutex>& clockLock) {
   changed_.notify_all();
-  changed_.wait(clockLock, [&] {
-    return (waiter->woken && (eventThreadAtRest_ || waiter->onEventThread)) || stopped_;
-  });
+  changed_.wait(clockLock,
+                [&] { return (waiter->woken && (eventThreadAtRest_ || waiter->onEventThread)) || stopped_; });
   waiters_.erase(waiter);
   changed_.notify_all();
 }
@@ -105,7 +104,7 @@ void SimulatedClock::stopWaiting() {
 }
 
 Transport::Outcome EmbeddedTransport::Receive(Clock::TimePoint deadline, Incoming* incoming) {
-  return hub_->RunUntil(deadline, incoming) ? Outcome::kIncoming : Outcome::kTimedOut;
+  return hub_->RunUntil(deadline, incoming) ? Outcome::kIncoming : Outcome::kDeadline;
 }
 
 HubLink makeEmbeddedLink(std::unique_ptr<EmbeddedHub> hub) {

@@ -6,8 +6,8 @@
 //   simulated time     stands still   moves from event to event        stands still
 //
 // A thread that waits is woken by a handler's notification or, when the next event lies past its deadline, at
-// once, with the time moved to the deadline. It goes on only after the event thread has come to rest, so that one
-// scenario and seed always give the same run.
+// once, with the time moved to the deadline. It goes on only after the event thread has come to rest, so that
+// one scenario and seed always give the same run.
 #pragma once
 
 #include <atomic>
@@ -31,8 +31,8 @@ class EmbeddedHub {
   [[nodiscard]] virtual int Submit(qmi::Bytes datagram) = 0;
 
   /// Runs the hub up to and including its next outgoing datagram or change, but no further than `limit`.
-  /// True: `incoming` holds it. False: nothing comes up to `limit`, and the hub's time is `limit` (when `limit` is
-  /// the largest time: nothing will ever come, and time stays).
+  /// True: `incoming` holds it. False: nothing comes up to `limit`, and the hub's time is `limit` (when
+  /// `limit` is the largest time: nothing will ever come, and time stays).
   [[nodiscard]] virtual bool RunUntil(Clock::TimePoint limit, Incoming* incoming) = 0;
 
   /// The hub's time: nanoseconds since its start.

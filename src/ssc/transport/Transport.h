@@ -24,11 +24,12 @@ class Transport {
  public:
   virtual ~Transport() = default;
 
-  /// Sends one datagram. Any thread, also while another receives. 0; kNotConnected while the hub is away; another
-  /// negated errno when this one datagram could not be sent. Never blocks for longer than a send may take.
+  /// Sends one datagram. Any thread, also while another receives. 0; kNotConnected while the hub is away;
+  /// another negated errno when this one datagram could not be sent. Never blocks for longer than a send may
+  /// take.
   [[nodiscard]] virtual int Send(qmi::Bytes datagram) = 0;
 
-  enum class Outcome { kIncoming, kTimedOut, kInterrupted };
+  enum class Outcome { kIncoming, kDeadline, kInterrupted };
 
   /// Takes the next thing that comes in, waiting for it until `deadline`. One thread at a time. After kDown
   /// nothing comes in until kUp; looking for the hub's return is done in here. `incoming` may be reused: its

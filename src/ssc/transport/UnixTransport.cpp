@@ -1,10 +1,10 @@
 #include "ssc/transport/UnixTransport.h"
 
-#include <sys/un.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+
+#include <sys/un.h>
 
 #include "ssc/Results.h"
 
@@ -15,7 +15,8 @@ namespace {
 bool fillAddress(const std::string& path, sockaddr_un* address) {
   *address = {};
   address->sun_family = AF_UNIX;
-  if (path.empty() || path.size() >= sizeof address->sun_path || path.find('\0') != std::string::npos) return false;
+  if (path.empty() || path.size() >= sizeof address->sun_path || path.find('\0') != std::string::npos)
+    return false;
   std::memcpy(address->sun_path, path.data(), path.size());
   return true;
 }
@@ -34,7 +35,8 @@ int UnixTransport::Connect(const std::string& path, std::unique_ptr<Transport>* 
 UnixTransport::UnixTransport(std::string path, Descriptor socket)
     : path_(std::move(path)),
       socket_(std::move(socket)),
-      buffers_(new std::array<std::array<std::uint8_t, kMaxDatagram>, kBatch>) {}  // uninitialised on purpose: 1 MiB
+      buffers_(new std::array<std::array<std::uint8_t, kMaxDatagram>, kBatch>) {
+}  // uninitialised on purpose: 1 MiB
 
 Descriptor UnixTransport::connectTo(const std::string& path) {
   sockaddr_un address{};
@@ -58,12 +60,16 @@ int UnixTransport::Send(qmi::Bytes datagram) {
   for (;;) {
     if (::send(socket_.get(), datagram.data(), datagram.size(), MSG_NOSIGNAL) >= 0) return kOk;
     switch (errno) {
-      case EINTR: continue;
+      case EINTR:
+        continue;
       case EPIPE:
       case ECONNRESET:
-      case ENOTCONN: return kNotConnected;  // the receiving side sees the end too
-      case EAGAIN: return kTimedOut;        // the hub does not take requests off its socket
-      default: return -errno;
+      case ENOTCONN:
+        return kNotConnected;  // the receiving side sees the end too
+      case EAGAIN:
+        return kTimedOut;  // the hub does not take requests off its socket
+      default:
+        return -errno;
     }
   }
 }
@@ -130,11 +136,13 @@ Transport::Outcome UnixTransport::Receive(Clock::TimePoint deadline, Incoming* i
     const bool connected = socket_.valid();
     const auto until = connected ? deadline : std::min(deadline, nextAttempt_);
     switch (interrupt_.WaitReadable(connected ? socket_.get() : -1, until)) {
-      case Interrupter::Woken::kInterrupted: return Outcome::kInterrupted;
-      case Interrupter::Woken::kTimedOut:
-        if (clock_.now() >= deadline) return Outcome::kTimedOut;
+      case Interrupter::Woken::kInterrupted:
+        return Outcome::kInterrupted;
+      case Interrupter::Woken::kDeadline:
+        if (clock_.now() >= deadline) return Outcome::kDeadline;
         break;
-      case Interrupter::Woken::kReady: break;
+      case Interrupter::Woken::kReady:
+        break;
     }
   }
 }

@@ -1,13 +1,13 @@
 // A hub in another process on this machine: a Unix-domain SOCK_SEQPACKET socket, one packet one QMI message.
 #pragma once
 
-#include <sys/socket.h>
-
 #include <array>
 #include <atomic>
 #include <memory>
 #include <mutex>
 #include <string>
+
+#include <sys/socket.h>
 
 #include "ssc/transport/Descriptor.h"
 #include "ssc/transport/Transport.h"
@@ -34,15 +34,16 @@ class UnixTransport final : public Transport {
 
   UnixTransport(std::string path, Descriptor socket);
   [[nodiscard]] static Descriptor connectTo(const std::string& path);
-  /// Moves the next datagram of the batch into `incoming`; reads a new batch when the last is used up. False: none now.
+  /// Moves the next datagram of the batch into `incoming`; reads a new batch when the last is used up. False:
+  /// none now.
   [[nodiscard]] bool takeDatagram(Incoming* incoming);
   void goDown();
 
   const std::string path_;
   Interrupter interrupt_;
-  std::mutex mutex_;    ///< guards replacing socket_; sends hold it
-  Descriptor socket_;   ///< closed while the hub is away; replaced by the receiving thread only
-  bool lost_ = false;   ///< receiving thread: the socket ended
+  std::mutex mutex_;   ///< guards replacing socket_; sends hold it
+  Descriptor socket_;  ///< closed while the hub is away; replaced by the receiving thread only
+  bool lost_ = false;  ///< receiving thread: the socket ended
   RealClock clock_;
   Clock::TimePoint nextAttempt_{};
 
