@@ -74,7 +74,7 @@ int Client::sendRequestsAndWaitFor(const std::vector<std::string>& requests, Clo
     if (timeout > Clock::Duration::zero()) {
       Clock& clock = connection->clock();
       const auto start = clock.now();
-      clock.wait(condition, lock, timeout);
+      clock.waitBySystemTime(condition, lock, timeout);
       if (clock.now() - start < timeout) result = status;
     }
   }

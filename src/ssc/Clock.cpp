@@ -1,5 +1,6 @@
 #include "ssc/Clock.h"
 
+#include <algorithm>
 #include <thread>
 
 namespace ssc {
@@ -10,15 +11,18 @@ Clock::TimePoint RealClock::now() const {
   return TimePoint{std::chrono::duration_cast<Duration>(std::chrono::steady_clock::now().time_since_epoch())};
 }
 
+template <class TimeSource>
+void RealClock::waitOn(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) {
+  const auto deadline = saturatingAdd(TimeSource::now(), std::max(timeout, Duration::zero()));
+  condition.native_.wait_until(lock, deadline);
+}
+
 void RealClock::wait(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) {
-  if (timeout <= Duration::zero()) {
-    // Still a wait: whoever needs the mutex gets its turn.
-    lock.unlock();
-    lock.lock();
-    return;
-  }
-  // The deadline is the system clock's: what a wait measures is left to the caller and the steady clock.
-  condition.native_.wait_until(lock, saturatingAdd(std::chrono::system_clock::now(), timeout));
+  waitOn<std::chrono::steady_clock>(condition, lock, timeout);
+}
+
+void RealClock::waitBySystemTime(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) {
+  waitOn<std::chrono::system_clock>(condition, lock, timeout);
 }
 
 void RealClock::notifyAll(Condition& condition) { condition.native_.notify_all(); }

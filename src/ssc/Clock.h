@@ -42,6 +42,11 @@ class Clock {
   /// One wait: it may also return early for no reason.
   virtual void wait(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) = 0;
 
+  /// The same with a deadline on the system's clock, so that setting that clock moves the deadline.
+  virtual void waitBySystemTime(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) {
+    wait(condition, lock, timeout);
+  }
+
   virtual void notifyAll(Condition& condition) = 0;
 
   virtual void sleepFor(Duration duration) = 0;
@@ -63,8 +68,13 @@ class RealClock final : public Clock {
  public:
   [[nodiscard]] TimePoint now() const override;
   void wait(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) override;
+  void waitBySystemTime(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) override;
   void notifyAll(Condition& condition) override;
   void sleepFor(Duration duration) override;
+
+ private:
+  template <class TimeSource>
+  static void waitOn(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout);
 };
 
 /// `time` + `duration`, or the largest time when that would overflow. `duration` >= 0.
