@@ -1,0 +1,208 @@
+#include "framework/Calibrator.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "ssc/AttrUtil.h"
+#include "ssc/Log.h"
+#include "ssc/SuidUtil.h"
+#include "ssc/Ticks.h"
+
+namespace {
+
+constexpr std::uint32_t kToleratedReconnections = 3;
+
+/// Whether the sensor's stream type is `streamType` and, if so, the package that its name stands for. Results
+/// as of the library.
+int readPackage(ssc::AttrUtil& attributeUtil, const ssc::SensorUid& suid,
+                sns_std_sensor_stream_type streamType, bool* isOfType, std::string* package) {
+  sns_std_attr_event attributes;
+  int result = attributeUtil.LoadAttributes(suid, &attributes);
+  if (result != ssc::kOk) return result;
+  sns_std_sensor_stream_type type{};
+  result = ssc::AttrUtil::GetStreamType(attributes, &type);
+  if (result != ssc::kOk) return result;
+  *isOfType = type == streamType;
+  if (!*isOfType) return ssc::kOk;
+  result = ssc::AttrUtil::GetName(attributes, package);
+  if (result == ssc::kOk) Calibrator::SensorNameToPackageName(package);
+  return result;
+}
+
+/// The first of the sensors that is of the package and the stream type, or null.
+const ssc::SensorUid* findInPackage(ssc::AttrUtil& attributeUtil, const std::vector<ssc::SensorUid>& suids,
+                                    const std::string& package, sns_std_sensor_stream_type streamType) {
+  for (const ssc::SensorUid& suid : suids) {
+    bool isOfType = false;
+    std::string itsPackage;
+    if (readPackage(attributeUtil, suid, streamType, &isOfType, &itsPackage) != ssc::kOk) continue;
+    if (isOfType && itsPackage == package) return &suid;
+  }
+  return nullptr;
+}
+
+std::string toLowerAscii(std::string text) {
+  for (char& c : text) {
+    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+  }
+  return text;
+}
+
+}  // namespace
+
+Calibrator::Calibrator(ssc::Connection* hubConnection, const char* usage, const char* options)
+    : ssc::Client(hubConnection), usage_(usage), options_(options) {}
+
+void Calibrator::OnEvent(const sns_client_event_msg& message) {
+  constexpr const char* kFunction = "virtual void Calibrator::OnEvent(const sns_client_event_msg &)";
+  ssc::logFunc(kFunction, "-->");
+  const std::lock_guard<std::mutex> guard(mutex);
+  if (handleSensorEvents(message)) condition.notify_all();
+  ssc::logFunc(kFunction, "<--");
+}
+
+/// Whether the wait is to end.
+bool Calibrator::handleSensorEvents(const sns_client_event_msg& message) {
+  const ssc::SensorUid suid(message.suid());
+  for (const auto& event : message.events()) {
+    if (event.msg_id() != ssc::kSensorEvent) continue;
+    if (!event_.ParseFromString(event.payload())) {
+      ssc::log(ssc::kLogError, "Received malformed sensor event");
+      status = ssc::kMalformed;
+      return true;
+    }
+    if (isShort(suid, event_)) continue;
+    if (OnSensorEvent(suid, event.timestamp(), event_)) return true;
+  }
+  return false;
+}
+
+bool Calibrator::isShort(const ssc::SensorUid& suid, const sns_std_sensor_event& event) {
+  const auto info = sensorInfo.find(suid);
+  const auto valueCount = static_cast<std::size_t>(event.data_size());
+  const std::size_t needed =
+      info == sensorInfo.end() ? SensorInfo().minimumValues : info->second.minimumValues;
+  if (valueCount >= needed) return false;
+  if (shortEventsReported_.insert(suid).second) {
+    ssc::log(ssc::kLogWarn, "Dropping %s events with fewer than %zu values (this is said once)",
+             info == sensorInfo.end() ? "sensor" : info->second.name.c_str(), needed);
+  }
+  return true;
+}
+
+bool Calibrator::OnSensorEvent(const ssc::SensorUid& suid, std::uint64_t timestamp,
+                               const sns_std_sensor_event& event) {
+  samples[suid].emplace_back(ssc::ticksToSeconds(timestamp), event.data().begin(), event.data().end());
+  return false;
+}
+
+void Calibrator::OnReconnect() {
+  constexpr const char* kFunction = "virtual void Calibrator::OnReconnect()";
+  ssc::logFunc(kFunction, "-->");
+  const std::lock_guard<std::mutex> guard(mutex);
+  status = ssc::kOk;
+  // Counted over the whole run: a retry that succeeded is not forgotten.
+  const std::uint32_t before = retryCount_++;
+  bool failed = true;
+  if (before < kToleratedReconnections) {
+    ssc::log(ssc::kLogDebug, "Retry %u", retryCount_);
+    for (const std::string& request : GetAllConfigRequests()) {
+      status = SendRequest(request);
+      if (status != ssc::kOk) break;
+    }
+    failed = status != ssc::kOk;
+  } else {
+    ssc::log(ssc::kLogDebug, "Exhausted all retries");
+    retryCount_ = 0;
+    status = ssc::kConnectionLost;
+  }
+  if (failed) {
+    ssc::log(ssc::kLogDebug, "Retry failed");
+    condition.notify_all();
+  }
+  ssc::logFunc(kFunction, "<--");
+}
+
+void Calibrator::SensorNameToPackageName(std::string* name) {
+  if (name == nullptr) return;
+  std::size_t end = name->find(' ');
+  if (end == std::string::npos) end = name->find('_');
+  if (end != std::string::npos) name->resize(end);
+}
+
+int Calibrator::LookupSuidsByName(const std::vector<std::string>& dataTypes,
+                                  std::map<std::string, ssc::SensorUid>* suids, std::string* packageName,
+                                  sns_std_sensor_stream_type streamType) {
+  ssc::SuidUtil suidUtil(connection);
+  ssc::AttrUtil attributeUtil(connection);
+  if (suids != nullptr) suids->clear();
+  std::string package;
+  for (const std::string& dataType : dataTypes) {
+    std::vector<ssc::SensorUid> found;
+    int result = suidUtil.Lookup(dataType, &found);
+    if (result != ssc::kOk) return result;
+    if (found.empty()) return ssc::kNotFound;
+    if (package.empty()) {
+      // The first sensor decides the package. One of another stream type is taken all the same, and the
+      // next data type decides.
+      if (suids != nullptr) suids->emplace(dataType, found.front());
+      bool isOfType = false;
+      result = readPackage(attributeUtil, found.front(), streamType, &isOfType, &package);
+      if (result != ssc::kOk) return result;
+    }
+    if (package.empty()) continue;
+    const ssc::SensorUid* const suid = findInPackage(attributeUtil, found, package, streamType);
+    if (suid == nullptr) {
+      ssc::log(ssc::kLogError, "Unable to find %s for %s", dataType.c_str(), package.c_str());
+      return ssc::kNotFound;
+    }
+    if (suids != nullptr) suids->emplace(dataType, *suid);
+  }
+  if (packageName != nullptr) *packageName = toLowerAscii(std::move(package));
+  return ssc::kOk;
+}
+
+bool Calibrator::LookupCompanion(const ssc::SensorUid& sensor, const std::string& dataType,
+                                 sns_std_sensor_stream_type streamType, ssc::SensorUid* companion) {
+  std::vector<ssc::SensorUid> found;
+  if (ssc::SuidUtil(connection).Lookup(dataType, &found) != ssc::kOk) return false;
+  ssc::AttrUtil attributeUtil(connection);
+  bool isOfType = false;
+  std::string package;
+  if (readPackage(attributeUtil, sensor, streamType, &isOfType, &package) != ssc::kOk || !isOfType)
+    return false;
+  const ssc::SensorUid* const suid = findInPackage(attributeUtil, found, package, streamType);
+  if (suid == nullptr) return false;
+  *companion = *suid;
+  return true;
+}
+
+void Calibrator::SetSensorInfo(const ssc::SensorUid& suid, const std::string& name, float rateHz,
+                               std::size_t minimumValues) {
+  sensorInfo.emplace(suid, SensorInfo{name, rateHz, minimumValues});
+}
+
+std::vector<std::string> Calibrator::GetAllConfigRequests() const {
+  std::vector<std::string> requests;
+  requests.reserve(sensorInfo.size());
+  for (const auto& [suid, info] : sensorInfo) requests.push_back(MakeConfigRequest(suid, info.rate, 0));
+  return requests;
+}
+
+void Calibrator::DisableAllSensors() {
+  // Results do not matter: the hub forgets a client's requests when it goes.
+  for (const auto& entry : sensorInfo) SendRequest(MakeDisableRequest(entry.first));
+}
+
+std::vector<std::string> Calibrator::beginCollection() {
+  ssc::say("Collecting samples...\n");
+  const std::lock_guard<std::mutex> guard(mutex);
+  status = ssc::kOk;
+  samples.clear();
+  return GetAllConfigRequests();
+}
+
+void Calibrator::endCollection(bool print) {
+  DisableAllSensors();
+  if (print) PrintSamples();
+}
