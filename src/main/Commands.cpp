@@ -1,0 +1,36 @@
+#include "main/Commands.h"
+
+#include <string_view>
+
+#include "mag/BaroCalibrator.h"
+
+namespace {
+
+bool anyDevice(DeviceType) { return true; }
+
+template <class Command>
+std::unique_ptr<Calibrator> make(ssc::Connection* connection) {
+  return std::make_unique<Command>(connection);
+}
+
+struct Command {
+  std::string_view word;
+  bool (*serves)(DeviceType);  ///< which devices have this variant of the command
+  std::unique_ptr<Calibrator> (*make)(ssc::Connection*);
+};
+
+// One row for each calibrator; of a command with variants the first that serves the device counts. The word
+// is compared as it stands, capitals included.
+constexpr Command kCommands[] = {
+    {"baro", anyDevice, make<BaroCalibrator>},
+};
+
+}  // namespace
+
+std::unique_ptr<Calibrator> makeCalibrator(const std::string& command, DeviceType deviceType,
+                                           ssc::Connection* connection) {
+  for (const Command& row : kCommands) {
+    if (row.word == command && row.serves(deviceType)) return row.make(connection);
+  }
+  return nullptr;
+}

@@ -1,0 +1,17 @@
+#include "main/Driver.h"
+
+#ifdef VANTLE_SIMULATOR
+#include <cstdio>
+
+#include "main/SimulatedHandset.h"
+#include "ssc/Results.h"
+#endif
+
+int main(int argc, char** argv) {
+#ifdef VANTLE_SIMULATOR
+  if (!prepareSimulatedHandset(stderr)) return ssc::kInvalid;
+  return runVantle(argc, argv, makeEmbeddedHub);
+#else
+  return runVantle(argc, argv);
+#endif
+}
