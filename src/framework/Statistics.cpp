@@ -16,12 +16,17 @@ float besselDivisor(const std::vector<Sample>& samples) {
   return static_cast<float>(static_cast<std::uint64_t>(samples.size()) - 1U);
 }
 
+/// 0/0 is a negative not-a-number on x86 and a positive one on the handset: printed, they would differ.
+float withPlainNan(float value) {
+  return std::isnan(value) ? std::numeric_limits<float>::quiet_NaN() : value;
+}
+
 }  // namespace
 
 float sampleFloatMean(const std::vector<Sample>& samples) {
   float sum = 0;
   for (const Sample& sample : samples) sum += firstValue(sample);
-  return sum / static_cast<float>(samples.size());
+  return withPlainNan(sum / static_cast<float>(samples.size()));
 }
 
 SampleData sampleDataMean(const std::vector<Sample>& samples) {
@@ -37,7 +42,7 @@ float sampleStdev(const std::vector<Sample>& samples, float mean) {
     const float difference = firstValue(sample) - mean;
     sum += difference * difference;
   }
-  return std::sqrt(sum / besselDivisor(samples));
+  return withPlainNan(std::sqrt(sum / besselDivisor(samples)));
 }
 
 SampleData sampleStdev(const std::vector<Sample>& samples, const SampleData& mean) {
@@ -48,6 +53,6 @@ SampleData sampleStdev(const std::vector<Sample>& samples, const SampleData& mea
     sum += squared;
   }
   sum /= besselDivisor(samples);
-  for (float& value : sum) value = std::sqrt(value);
+  for (float& value : sum) value = withPlainNan(std::sqrt(value));
   return sum;
 }
