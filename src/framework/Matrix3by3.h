@@ -26,7 +26,7 @@ class Matrix3by3 {
     return elements_[row * 3 + column];
   }
   constexpr T& operator()(std::size_t row, std::size_t column) { return elements_[row * 3 + column]; }
-  [[nodiscard]] constexpr const std::array<T, kElements>& elements() const { return elements_; }
+  [[nodiscard]] constexpr std::array<T, kElements> elements() const { return elements_; }
 
   friend constexpr bool operator==(const Matrix3by3&, const Matrix3by3&) = default;
 
