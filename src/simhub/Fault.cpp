@@ -26,7 +26,7 @@ constexpr FaultKindRow kRows[] = {
      "A request is refused in its QMI response with error `error`, and not carried out."},
     {kNoResponse, "no_response", kRequests, "sensor message",
      "A request is carried out, but its QMI response never comes."},
-    {kErrorEvent, "error_event", kRequests, "sensor message error",
+    {kErrorAnswer, "error_event", kRequests, "sensor message error",
      "A request is taken but answered by an error event with error `error`, and not carried out."},
     {kLateResponse, "late_response", kRequests, "sensor message delay",
      "A request is carried out, but its QMI response comes `delay` seconds late."},

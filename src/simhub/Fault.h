@@ -26,7 +26,7 @@ enum class FaultKind {
   kReorder,
   kQmiError,
   kNoResponse,
-  kErrorEvent,
+  kErrorAnswer,
   kLateResponse,
   kNoNotification,
   kOemFailure,
