@@ -14,7 +14,6 @@
 namespace simhub {
 namespace {
 
-constexpr const char* kDefaultScenario = "o1v1";
 constexpr std::string_view kCommon = "common";  // what the built-in ones extend; not a handset by itself
 constexpr std::size_t kMaxFileBytes = std::size_t{4} << 20;
 constexpr int kMaxExtends = 8;
@@ -124,7 +123,7 @@ std::vector<std::string> builtInScenarios() {
 
 bool loadScenario(const std::string& nameOrFile, const std::vector<std::string>& overrides,
                   Scenario* scenario, std::string* error) {
-  const std::string& name = nameOrFile.empty() ? kDefaultScenario : nameOrFile;
+  const std::string name = nameOrFile.empty() ? kDefaultScenario : nameOrFile;
   Problems problems;
   toml::table table;
   const bool ok = loadTable(name, "", 0, &table, &problems) &&

@@ -66,10 +66,13 @@ struct Scenario {
   std::vector<Fault> faults;                          ///< in the order of their names
 };
 
+/// The scenario where nobody asks for another.
+inline constexpr const char* kDefaultScenario = "o1v1";
+
 /// Names of the built-in scenarios.
 [[nodiscard]] std::vector<std::string> builtInScenarios();
 
-/// Loads a scenario: `nameOrFile` is a built-in name, or else a file ("" means the default, o1v1).
+/// Loads a scenario: `nameOrFile` is a built-in name, or else a file ("" means the default).
 /// `overrides` are "KEY=VALUE" with a dotted key, as they would stand in the file; a value that is no TOML
 /// value is taken as text. False: `error` holds one line for each fault found, "FILE:LINE: KEY: what is
 /// wrong".
