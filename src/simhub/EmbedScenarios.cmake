@@ -1,0 +1,11 @@
+# Writes OUTPUT, a source file that holds the text of every file of FILES under its name without ".toml".
+set(source "// Generated from scenarios/*.toml.\n#include \"simhub/EmbeddedScenarios.h\"\n\nnamespace simhub {\n\n")
+string(APPEND source "std::span<const EmbeddedScenario> embeddedScenarios() {\n")
+string(APPEND source "  static constexpr EmbeddedScenario kScenarios[] = {\n")
+foreach(file IN LISTS FILES)
+  get_filename_component(name ${file} NAME_WE)
+  file(READ ${file} text)
+  string(APPEND source "      {\"${name}\", R\"__toml__(${text})__toml__\"},\n")
+endforeach()
+string(APPEND source "  };\n  return kScenarios;\n}\n\n}  // namespace simhub\n")
+file(WRITE ${OUTPUT} "${source}")

@@ -1,0 +1,46 @@
+// The files of one folder, written so that a crash loses nothing that was reported as written. Every
+// operation is one step that a test can make fail or stop at.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace simhub {
+
+class RegistryFiles {
+ public:
+  /// `folder` with or without a closing slash.
+  explicit RegistryFiles(std::string folder);
+  virtual ~RegistryFiles() = default;
+
+  /// Creates the folder and those above it. 0 or an errno value, as every function here.
+  [[nodiscard]] int CreateFolder();
+  /// The names of everything in the folder, sorted.
+  [[nodiscard]] std::vector<std::string> List() const;
+  /// A regular file's content. EFBIG when it is larger than `limit`, EINVAL when it is no regular file.
+  [[nodiscard]] int Read(const std::string& name, std::size_t limit, std::string* content) const;
+
+  /// Makes a file of that content and syncs it. Anything short of that (also where the disk turns out to be
+  /// full only at the sync or the close) is an error, and the file may hold part of it.
+  [[nodiscard]] virtual int Write(const std::string& name, const std::string& content);
+  [[nodiscard]] virtual int Rename(const std::string& from, const std::string& to);
+  /// ENOENT counts as success.
+  [[nodiscard]] virtual int Remove(const std::string& name);
+  /// Makes the renames and removals so far durable.
+  [[nodiscard]] virtual int SyncFolder();
+
+  /// From now on only so many bytes fit in; nothing: no such limit.
+  void LimitFreeBytes(std::optional<std::uint64_t> bytes) { freeBytes_ = bytes; }
+  [[nodiscard]] bool IsLimited() const { return freeBytes_.has_value(); }
+
+  [[nodiscard]] std::string Path(const std::string& name) const { return folder_ + "/" + name; }
+
+ private:
+  std::string folder_;  ///< without a closing slash
+  std::optional<std::uint64_t> freeBytes_;
+};
+
+}  // namespace simhub

@@ -1,0 +1,34 @@
+#include "simhub/SensorModels.h"
+
+#include "simhub/sensors/Barometer.h"
+#include "simhub/sensors/Thermometer.h"
+
+namespace simhub {
+namespace {
+
+template <class Model>
+std::unique_ptr<Sensor> make(const SensorConfig& config, const SensorSurroundings& surroundings) {
+  return std::make_unique<Model>(config, surroundings);
+}
+
+constexpr SensorModel kModels[] = {
+    {"barometer",
+     "_0_platform.pressure.fac_cal",
+     {},
+     make<Barometer>,
+     "One value, the air pressure in hPa. Calibration: the first number of \"bias\" is subtracted."},
+    {"temperature", "", {}, make<Thermometer>, "One value, the chip's temperature in °C."},
+};
+
+}  // namespace
+
+std::span<const SensorModel> sensorModels() { return kModels; }
+
+const SensorModel* findSensorModel(std::string_view name) {
+  for (const SensorModel& model : kModels) {
+    if (name == model.name) return &model;
+  }
+  return nullptr;
+}
+
+}  // namespace simhub
