@@ -6,6 +6,7 @@ function(vantle_library name)
   add_library(${name} STATIC ${sources})
   target_include_directories(${name} PUBLIC ${PROJECT_SOURCE_DIR}/src)
   target_link_libraries(${name} PUBLIC ${ARGN})
+  set_property(GLOBAL APPEND PROPERTY VANTLE_LIBRARIES ${name})
   vantle_lint(${name})
 endfunction()
 
