@@ -15,6 +15,7 @@ using Item = sns_registry_data_item;
 
 constexpr int kMaxDepth = 16;               // of subgroups
 constexpr std::size_t kMaxNameBytes = 240;  // with what is put around it, still a file name
+constexpr std::size_t kMaxJournalBytes = std::size_t{8} << 20;
 constexpr const char* kJournal = ".journal";
 constexpr const char* kNewJournal = ".journal.new";
 constexpr const char* kJournalMark = "registry write\n";
@@ -31,25 +32,26 @@ bool canBeSubgroup(const std::string& name) { return !name.empty() && name.find(
 
 std::string describe(int error) { return std::strerror(error); }
 
-/// The journal: a mark, the names of the files, one a line, and a checksum of it all. Names hold any byte but
-/// '/' and zero, so they are ended by zero bytes.
-std::string formatJournal(const std::vector<std::string>& names) {
+/// The journal: a mark, each file's name and the hash of its new content, and a hash of it all. Names hold
+/// any byte but '/' and zero.
+std::string formatJournal(const std::map<std::string, std::string>& contents) {
   std::string text = kJournalMark;
-  for (const std::string& name : names) text += name + '\0';
-  return text + std::to_string(hashText(text)) + "\n";
+  for (const auto& [name, content] : contents) text += name + '\0' + std::to_string(hashText(content)) + '\n';
+  return text + std::to_string(hashText(text)) + '\n';
 }
 
-bool parseJournal(const std::string& text, std::vector<std::string>* names) {
-  const std::size_t mark = std::strlen(kJournalMark);
+/// Names and hashes, hashes as they are written.
+bool parseJournal(const std::string& text, std::map<std::string, std::string>* hashes) {
   if (text.rfind(kJournalMark, 0) != 0) return false;
-  std::size_t position = mark;
-  for (std::size_t end = text.find('\0', position); end != std::string::npos;
-       end = text.find('\0', position)) {
-    names->push_back(text.substr(position, end - position));
+  std::size_t position = std::strlen(kJournalMark);
+  for (std::size_t zero = text.find('\0'); zero != std::string::npos; zero = text.find('\0', position)) {
+    const std::string name = text.substr(position, zero - position);
+    const std::size_t end = text.find('\n', zero);
+    if (!canBeFileName(name) || end == std::string::npos) return false;
+    (*hashes)[name] = text.substr(zero + 1, end - zero - 1);
     position = end + 1;
-    if (!canBeFileName(names->back())) return false;
   }
-  return text.substr(position) == std::to_string(hashText(text.substr(0, position))) + "\n";
+  return text.substr(position) == std::to_string(hashText(text.substr(0, position))) + '\n';
 }
 
 Item* findItem(sns_registry_data* items, const std::string& name) {
@@ -187,69 +189,67 @@ bool RegistryStore::merge(const std::string& group, const sns_registry_data& ite
 
 bool RegistryStore::store(const Groups& changed, std::string* error) {
   if (!finishJournal(error)) return false;  // an earlier write, committed but not completed
-  std::vector<std::string> names;
+  std::map<std::string, std::string> contents;
+  for (const auto& [name, group] : changed) contents[name] = formatRegistryGroup(group.items);
+  const bool isJournaled = contents.size() > 1;
   int failure = 0;
-  for (const auto& [name, group] : changed) {
-    const std::string text = formatRegistryGroup(group.items);
-    names.push_back(name);
-    failure = text.size() > kMaxRegistryFileBytes ? EFBIG : files_.Write(newName(name), text);
-    if (failure != 0) break;
+  for (const auto& [name, content] : contents) {
+    if (failure == 0)
+      failure = content.size() > kMaxRegistryFileBytes ? EFBIG : files_.Write(newName(name), content);
   }
-  const bool journaled = names.size() > 1;
-  if (failure == 0) failure = journaled ? commitJournal(names) : files_.Rename(newName(names[0]), names[0]);
-  if (failure == 0 && !journaled) failure = files_.SyncFolder();
+  if (failure == 0 && isJournaled) failure = files_.Write(kNewJournal, formatJournal(contents));
+  if (failure == 0) {
+    const std::string& only = contents.begin()->first;
+    failure = isJournaled ? files_.Rename(kNewJournal, kJournal) : files_.Rename(newName(only), only);
+  }
+  if (failure == 0) failure = files_.SyncFolder();
   if (failure != 0) {
     *error = describe(failure);
-    dropNewFiles(names);
+    undo(contents);
     return false;
   }
   std::string later;
-  if (journaled && !finishJournal(&later)) diagnostics_("registry journal, to be completed later: " + later);
+  if (isJournaled && !finishJournal(&later))
+    diagnostics_("registry journal, to be completed later: " + later);
   return true;
 }
 
-int RegistryStore::commitJournal(const std::vector<std::string>& names) {
-  int failure = files_.Write(kNewJournal, formatJournal(names));
-  if (failure == 0) failure = files_.SyncFolder();  // what the journal names is there before the journal is
-  if (failure == 0) failure = files_.Rename(kNewJournal, kJournal);
-  if (failure == 0) failure = files_.SyncFolder();
-  return failure;
+void RegistryStore::undo(const std::map<std::string, std::string>& contents) {
+  // While a journal may still stand, a start would complete the write: then all of its files stay.
+  if (files_.Remove(kJournal) != 0 || files_.SyncFolder() != 0) return;
+  for (const auto& [name, content] : contents) (void)files_.Remove(newName(name));
+  (void)files_.Remove(kNewJournal);
+}
+
+bool RegistryStore::holds(const std::string& file, const std::string& hash) const {
+  std::string content;
+  return files_.Read(file, kMaxRegistryFileBytes, &content) == 0 && std::to_string(hashText(content)) == hash;
 }
 
 bool RegistryStore::finishJournal(std::string* error) {
   std::string text;
-  const int failure = files_.Read(kJournal, kMaxRegistryFileBytes, &text);
+  int failure = files_.Read(kJournal, kMaxJournalBytes, &text);
   if (failure == ENOENT) return true;
-  if (failure != 0) {
-    *error = describe(failure);
-    return false;
-  }
-  std::vector<std::string> names;
-  if (!parseJournal(text, &names)) {
-    // It came into place whole or not at all, so this is none of the store's; nothing in it can be trusted.
-    diagnostics_("registry journal " + files_.Path(kJournal) + " makes no sense and is dropped");
-    names.clear();
-  }
-  for (const std::string& name : names) {
-    const int renamed = files_.Rename(newName(name), name);
-    if (renamed != 0 && renamed != ENOENT) {  // ENOENT: renamed before the crash
-      *error = describe(renamed);
-      return false;
+  std::map<std::string, std::string> hashes;
+  bool isCommitted = failure == 0 && parseJournal(text, &hashes);
+  std::vector<std::string> pending;
+  for (const auto& [name, hash] : hashes) {
+    if (holds(newName(name), hash)) {
+      pending.push_back(name);
+    } else if (!holds(name, hash)) {
+      // The crash came before the folder was synced: nothing is renamed yet, and the write has not happened.
+      isCommitted = false;
     }
   }
-  int finished = files_.SyncFolder();
-  if (finished == 0) finished = files_.Remove(kJournal);
-  if (finished == 0) finished = files_.SyncFolder();
-  if (finished != 0) *error = describe(finished);
-  return finished == 0;
-}
-
-void RegistryStore::dropNewFiles(const std::vector<std::string>& names) {
-  // While a journal may still stand, a start would complete the write from whatever new files it finds: then
-  // all of them stay.
-  if (files_.Remove(kJournal) != 0 || files_.SyncFolder() != 0) return;
-  for (const std::string& name : names) (void)files_.Remove(newName(name));
-  (void)files_.Remove(kNewJournal);
+  if (!isCommitted) pending.clear();
+  for (const std::string& name : pending) {
+    if (failure == 0) failure = files_.Rename(newName(name), name);
+  }
+  if (failure == 0) failure = files_.SyncFolder();
+  // Should the journal come back after a crash, it finds everything done.
+  if (failure == 0) failure = files_.Remove(kJournal);
+  if (failure != 0) *error = describe(failure);
+  return failure == 0;
 }
 
 }  // namespace simhub

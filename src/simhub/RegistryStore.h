@@ -7,10 +7,14 @@
 // A write merges: a written item replaces the item of that name, in a subgroup too; the others stay. It is
 // one durable step, also over several files:
 //   1. every new file is written beside the old one, as ".NAME.new", and synced
-//   2. more than one: ".journal" with their names is written, synced and renamed into place; this commits the
-//   write
-//   3. the new files are renamed over the old ones (a single one: this commits), the journal is removed
-// Loading completes what a journal lists and drops new files that none lists.
+//   2. more than one: ".journal" with their names and hashes is written, synced and renamed into place, and
+//   the
+//      folder synced; this commits the write
+//   3. the new files are renamed over the old ones (a single one: this commits), the folder is synced, the
+//   journal
+//      removed
+// Loading completes what a journal lists and drops new files that none lists, and a journal whose files are
+// not all there: it was not committed.
 #pragma once
 
 #include <map>
@@ -55,11 +59,11 @@ class RegistryStore {
   [[nodiscard]] bool merge(const std::string& group, const sns_registry_data& items, int depth,
                            Groups* changed, std::string* error) const;
   [[nodiscard]] bool store(const Groups& changed, std::string* error);
-  /// 0 or an errno value, as of RegistryFiles.
-  [[nodiscard]] int commitJournal(const std::vector<std::string>& names);
+  /// Drops what a failed write has left.
+  void undo(const std::map<std::string, std::string>& contents);
   /// Completes the write that the journal stands for, if there is one.
   [[nodiscard]] bool finishJournal(std::string* error);
-  void dropNewFiles(const std::vector<std::string>& names);
+  [[nodiscard]] bool holds(const std::string& file, const std::string& hash) const;
 
   RegistryFiles& files_;
   const Defaults defaults_;

@@ -55,6 +55,8 @@ std::string typeName(const toml::node& node) {
 }  // namespace
 
 void Problems::Add(const toml::node* node, const std::string& key, const std::string& what) {
+  // A setting taken over from another section has no place; where it stands it is reported as well.
+  if (node != nullptr && !node->source().path && !node->is_table()) return;
   AddText(place(node, source_) + ": " + (key.empty() ? "" : key + ": ") + what);
 }
 

@@ -46,8 +46,8 @@ bool HubHarness::SendAs(simhub::ClientId from, const simhub::Suid& suid, std::ui
   if (batchMicroseconds != 0) request->mutable_batching()->set_batch_period(batchMicroseconds);
   const std::string bytes = message.SerializeAsString();
   std::vector<std::uint8_t> datagram;
-  EXPECT_TRUE(qmi::encodeRequest(++transaction, {reinterpret_cast<const std::uint8_t*>(bytes.data()), bytes.size()},
-                                 &datagram));
+  EXPECT_TRUE(qmi::encodeRequest(
+      ++transaction, {reinterpret_cast<const std::uint8_t*>(bytes.data()), bytes.size()}, &datagram));
   return hub->HandleDatagram(from, datagram);
 }
 
@@ -167,11 +167,20 @@ std::string show(const sns_registry_data& data) {
     char number[48];
     std::snprintf(number, sizeof number, "=%.9g", static_cast<double>(item.flt()));
     switch (item.data_case()) {
-      case sns_registry_data_item::kSubgrp: text += "={" + show(item.subgrp()) + "}"; break;
-      case sns_registry_data_item::kStr: text += "='" + item.str() + "'"; break;
-      case sns_registry_data_item::kFlt: text += number; break;
-      case sns_registry_data_item::kSint: text += "=" + std::to_string(item.sint()) + "i"; break;
-      case sns_registry_data_item::DATA_NOT_SET: break;
+      case sns_registry_data_item::kSubgrp:
+        text += "={" + show(item.subgrp()) + "}";
+        break;
+      case sns_registry_data_item::kStr:
+        text += "='" + item.str() + "'";
+        break;
+      case sns_registry_data_item::kFlt:
+        text += number;
+        break;
+      case sns_registry_data_item::kSint:
+        text += "=" + std::to_string(item.sint()) + "i";
+        break;
+      case sns_registry_data_item::DATA_NOT_SET:
+        break;
     }
   }
   return text;

@@ -1,12 +1,12 @@
 // A simulated hub and a client that speaks to it in datagrams, as over a socket.
 #pragma once
 
-#include <gtest/gtest.h>
-
 #include <memory>
 #include <optional>
 #include <string>
 #include <vector>
+
+#include <gtest/gtest.h>
 
 #include "proto/sns_client.pb.h"
 #include "proto/sns_registry.pb.h"
@@ -52,7 +52,8 @@ class HubHarness : public simhub::HubOutput {
   bool SendAs(simhub::ClientId from, const simhub::Suid& suid, std::uint32_t messageId,
               const std::string& payload = {}, std::uint32_t batchMicroseconds = 0);
   /// Sends a request and runs the hub until its answering event came, or for 10 s: nothing.
-  std::optional<SeenEvent> Ask(const simhub::Suid& suid, std::uint32_t messageId, const std::string& payload = {});
+  std::optional<SeenEvent> Ask(const simhub::Suid& suid, std::uint32_t messageId,
+                               const std::string& payload = {});
 
   void Run(double seconds) { hub->AdvanceTo(hub->Now() + simhub::fromSeconds(seconds)); }
   void Configure(const simhub::Suid& suid, float rate, std::uint32_t batchMicroseconds = 0);

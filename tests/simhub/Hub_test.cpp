@@ -1,9 +1,9 @@
 #include "simhub/Hub.h"
 
+#include <cmath>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-
-#include <cmath>
 
 #include "simhub/HubHarness.h"
 
