@@ -31,7 +31,7 @@ class CalibratorCollect : public testing::Test {
   }
 
   /// Lets `act` happen when the stream of sensor a is asked for, instead of a stream.
-  void whenStreamed(std::function<void(ScriptedHub&)> act) {
+  void whenStreamed(const std::function<void(ScriptedHub&)>& act) {
     script->onRequest = [this, act](ScriptedHub& hub, const sns_client_request_msg& request) {
       if (ssc::SensorUid(request.suid()) != a || request.msg_id() != 513) return false;
       act(hub);

@@ -41,7 +41,7 @@ class BaroTest : public testing::Test {
     script->registry[kGroup] = data;
   }
 
-  void readPressure(std::function<float(int)> pressureAt) {
+  void readPressure(const std::function<float(int)>& pressureAt) {
     for (ScriptedSensor& sensor : script->sensors) {
       if (sensor.suid == temperature) continue;
       sensor.reading = [pressureAt](int index) { return std::vector<float>{pressureAt(index)}; };
