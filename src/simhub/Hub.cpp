@@ -15,7 +15,6 @@
 #include "simhub/RegistrySensor.h"
 #include "simhub/RegistryStore.h"
 #include "simhub/RequestLog.h"
-#include "simhub/SensorModels.h"
 #include "simhub/Streams.h"
 
 namespace simhub {
@@ -38,7 +37,7 @@ SensorConfig serviceConfig(const char* dataType) {
 
 class Hub::Impl {
  public:
-  Impl(Scenario scenario, const std::string& folder, HubOutput& output);
+  Impl(Scenario scenario, const std::string& folder, HubOutput& output, const SensorMaker& makeSensor);
 
   [[nodiscard]] int OpenLog() { return log_.Open(scenario_.hub.requestLog); }
   [[nodiscard]] const std::string& LogPath() const { return scenario_.hub.requestLog; }
@@ -117,7 +116,8 @@ class Hub::Impl {
   sns_client_request_msg message_;  // the request at hand, reused
 };
 
-Hub::Impl::Impl(Scenario scenario, const std::string& folder, HubOutput& output)
+Hub::Impl::Impl(Scenario scenario, const std::string& folder, HubOutput& output,
+                const SensorMaker& makeSensor)
     : scenario_(std::move(scenario)),
       output_(output),
       outbox_(output, queue_, statistics_, scenario_.hub.startTicks),
@@ -130,7 +130,7 @@ Hub::Impl::Impl(Scenario scenario, const std::string& folder, HubOutput& output)
   const SensorSurroundings surroundings{scenario_.world, scenario_.hub.seed};
   for (const SensorConfig& config : scenario_.sensors) {
     const auto index = static_cast<std::uint32_t>(sensors_.size());
-    sensors_.push_back(findSensorModel(config.model)->make(config, surroundings));
+    sensors_.push_back(makeSensor(config, surroundings));
     bySuid_[sensors_.back()->Suid()] = index;
   }
   bySuid_[registrySuid_] = static_cast<std::uint32_t>(sensors_.size());
@@ -419,8 +419,8 @@ void Hub::Impl::Step() {
 // ---------------------------------------------------------------------------------------------
 
 std::unique_ptr<Hub> Hub::Create(Scenario scenario, const std::string& registryFolder, HubOutput& output,
-                                 std::string* error) {
-  auto impl = std::make_unique<Impl>(std::move(scenario), registryFolder, output);
+                                 std::string* error, const SensorMaker& makeSensor) {
+  auto impl = std::make_unique<Impl>(std::move(scenario), registryFolder, output, makeSensor);
   if (!impl->LogPath().empty()) {
     if (const int failure = impl->OpenLog(); failure != 0) {
       *error = "hub.request_log: " + impl->LogPath() + ": " + std::strerror(failure);

@@ -11,6 +11,7 @@
 #include "qmi/Qmi.h"
 #include "simhub/HubTime.h"
 #include "simhub/Scenario.h"
+#include "simhub/SensorModels.h"
 
 namespace simhub {
 
@@ -40,9 +41,11 @@ struct HubStatistics {
 class Hub {
  public:
   /// Makes and starts a hub whose registry files stand in the folder `registryFolder` (created when missing).
-  /// Null, with `error` set, when the request log cannot be opened. `output` outlives the hub.
+  /// Null, with `error` set, when the request log cannot be opened. `output` outlives the hub. Other sensors
+  /// than those of the scenario's models come from `makeSensor`.
   [[nodiscard]] static std::unique_ptr<Hub> Create(Scenario scenario, const std::string& registryFolder,
-                                                   HubOutput& output, std::string* error);
+                                                   HubOutput& output, std::string* error,
+                                                   const SensorMaker& makeSensor = simhub::makeSensor);
   ~Hub();
 
   [[nodiscard]] ClientId AddClient();

@@ -4,6 +4,8 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
+#include <memory>
 #include <span>
 #include <string>
 #include <string_view>
@@ -87,6 +89,9 @@ class Sensor {
   NoiseGenerator noise_;
   sns_std_sensor_event event_;  ///< reused, so that a reading allocates nothing
 };
+
+/// Makes the sensor of a section.
+using SensorMaker = std::function<std::unique_ptr<Sensor>(const SensorConfig&, const SensorSurroundings&)>;
 
 /// The package a sensor's name stands for, in lower case: cut at the first blank, else at the first
 /// underscore.

@@ -31,4 +31,8 @@ const SensorModel* findSensorModel(std::string_view name) {
   return nullptr;
 }
 
+std::unique_ptr<Sensor> makeSensor(const SensorConfig& config, const SensorSurroundings& surroundings) {
+  return findSensorModel(config.model)->make(config, surroundings);
+}
+
 }  // namespace simhub

@@ -33,5 +33,8 @@ struct SensorModel {
 
 [[nodiscard]] std::span<const SensorModel> sensorModels();
 [[nodiscard]] const SensorModel* findSensorModel(std::string_view name);
+/// By the section's model, which has to be one of those.
+[[nodiscard]] std::unique_ptr<Sensor> makeSensor(const SensorConfig& config,
+                                                 const SensorSurroundings& surroundings);
 
 }  // namespace simhub

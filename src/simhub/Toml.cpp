@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <charconv>
+#include <cmath>
 #include <utility>
 
 namespace simhub {
@@ -129,6 +130,10 @@ bool TableReader::Integer(std::string_view key, std::int64_t low, std::int64_t h
 bool TableReader::Text(std::string_view key, std::string* value) {
   const toml::node* const node = Node(key);
   if (node == nullptr) return false;
+  if (const auto* const number = node->as_floating_point(); number != nullptr && std::isnan(number->get())) {
+    *value = "nan";  // an override's kind=nan: without quotes that is a number in TOML
+    return true;
+  }
   if (!node->is_string()) {
     Problem(key, "has to be text, is " + typeName(*node));
     return false;

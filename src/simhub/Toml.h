@@ -2,14 +2,12 @@
 // and range, and keys that nobody reads are reported as unknown.
 #pragma once
 
-#define TOML_HEADER_ONLY 1
-#define TOML_EXCEPTIONS 0
 #include <cstdint>
 #include <string>
 #include <string_view>
 #include <vector>
 
-#include <toml++/toml.h>
+#include "simhub/TomlLibrary.h"
 
 namespace simhub {
 

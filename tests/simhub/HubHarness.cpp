@@ -1,8 +1,11 @@
 #include "simhub/HubHarness.h"
 
 #include <cstdio>
+#include <utility>
 
-HubHarness::HubHarness(const std::vector<std::string>& overrides, const std::string& scenarioName) {
+HubHarness::HubHarness(const std::vector<std::string>& overrides, const std::string& scenarioName,
+                       simhub::SensorMaker makeSensor)
+    : makeSensor_(std::move(makeSensor)) {
   std::string error;
   EXPECT_TRUE(simhub::loadScenario(scenarioName, overrides, &scenario, &error)) << error;
   Restart();
@@ -11,7 +14,7 @@ HubHarness::HubHarness(const std::vector<std::string>& overrides, const std::str
 void HubHarness::Restart() {
   std::string error;
   hub.reset();
-  hub = simhub::Hub::Create(scenario, folder.Path("registry"), *this, &error);
+  hub = simhub::Hub::Create(scenario, folder.Path("registry"), *this, &error, makeSensor_);
   EXPECT_NE(hub, nullptr) << error;
   client = hub->AddClient();
 }

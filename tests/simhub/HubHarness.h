@@ -36,7 +36,8 @@ struct SeenResponse {
 class HubHarness : public simhub::HubOutput {
  public:
   /// A hub of the scenario (a built-in name) with overrides. Fails the test when there is none.
-  explicit HubHarness(const std::vector<std::string>& overrides = {}, const std::string& scenario = "o1v1");
+  explicit HubHarness(const std::vector<std::string>& overrides = {}, const std::string& scenario = "o1v1",
+                      simhub::SensorMaker makeSensor = simhub::makeSensor);
 
   /// A new hub, as after a restart, over the same files.
   void Restart();
@@ -84,6 +85,7 @@ class HubHarness : public simhub::HubOutput {
   std::vector<simhub::Time> ups;
 
  private:
+  simhub::SensorMaker makeSensor_;
   std::size_t reports_ = 0;
 };
 
