@@ -30,6 +30,8 @@ void makeDeviceFolders(const std::filesystem::path& root) {
         "sys/devices/platform/soc/soc:qcom,dsi-display-primary"}) {
     std::filesystem::create_directories(root / folder, ignored);
   }
+  // The display driver's node, which is there whether or not anything was written to it.
+  (void)writeFile(root / "sys/devices/platform/soc/soc:qcom,dsi-display-primary/te2_table", "");
 }
 
 std::optional<std::string> readFile(const std::filesystem::path& path) {
