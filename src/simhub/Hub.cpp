@@ -247,7 +247,7 @@ void Hub::Impl::carryOut(const Call& call) {
   }
   const RegistrySensor::Answer reply = registry_.Handle(call.messageId, call.request.payload(), now_);
   if (reply.error != SNS_STD_ERROR_NO_ERROR) {
-    answerError(call, reply.error);
+    answerError(call, static_cast<std::uint32_t>(reply.error));
   } else {
     answer(call, reply.messageId, reply.payload);
   }

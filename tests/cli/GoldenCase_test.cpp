@@ -147,6 +147,8 @@ TEST(GoldenHex, GivesEveryByteBack) {
 
 TEST(GoldenHex, IsForContentThatIsNoText) {
   EXPECT_FALSE(golden::isBinary("text\twith tabs\r\n"));
+  EXPECT_FALSE(golden::isBinary("27.5 \xc2\xb0\x43, \xe2\x88\x92"));
+  EXPECT_TRUE(golden::isBinary("\xc2"));
   EXPECT_TRUE(golden::isBinary(std::string(1, '\0')));
   EXPECT_TRUE(golden::isBinary("\x7f"));
   EXPECT_TRUE(golden::isBinary("\xe9"));

@@ -50,6 +50,23 @@ bool readStretch(const std::string& line, std::size_t* at, std::string* word) {
   return true;
 }
 
+/// The length of the UTF-8 character at `at`; 0 when there is none.
+std::size_t characterLength(const std::string& content, std::size_t at) {
+  const auto byte = [&](std::size_t i) {
+    return i < content.size() ? static_cast<unsigned char>(content[i]) : 0U;
+  };
+  const unsigned first = byte(at);
+  const std::size_t length = first < 0x80                    ? 1
+                             : first >= 0xc2 && first < 0xe0 ? 2
+                             : first >= 0xe0 && first < 0xf0 ? 3
+                             : first >= 0xf0 && first < 0xf5 ? 4
+                                                             : 0;
+  for (std::size_t i = 1; i < length; ++i) {
+    if ((byte(at + i) & 0xc0U) != 0x80U) return 0;
+  }
+  return length;
+}
+
 }  // namespace
 
 std::string encodeText(const std::string& content) {
@@ -115,9 +132,15 @@ std::optional<std::string> decodeHex(const std::string& lines) {
 }
 
 bool isBinary(const std::string& content) {
-  return std::any_of(content.begin(), content.end(), [](unsigned char c) {
-    return c >= 0x7f || (c < 0x20 && c != '\n' && c != '\t' && c != '\r');
-  });
+  for (std::size_t at = 0; at < content.size();) {
+    const std::size_t length = characterLength(content, at);
+    const auto first = static_cast<unsigned char>(content[at]);
+    const bool control =
+        first == 0x7f || (first < 0x20 && std::string("\n\t\r").find(content[at]) == std::string::npos);
+    if (length == 0 || control) return true;
+    at += length;
+  }
+  return false;
 }
 
 std::optional<std::vector<std::string>> splitWords(const std::string& line) {
