@@ -107,7 +107,13 @@ void readRegistryItems(const toml::table& table, const std::string& path, int de
     } else if (node.is_integer()) {
       item->set_sint(node.as_integer()->get());
     } else if (node.is_floating_point()) {
-      item->set_flt(static_cast<float>(node.as_floating_point()->get()));
+      const double number = node.as_floating_point()->get();
+      if (std::isfinite(number) &&
+          std::fabs(number) > static_cast<double>(std::numeric_limits<float>::max())) {
+        reader.Problem(key.str(), showNumber(number) + " does not fit a single-precision float");
+        continue;
+      }
+      item->set_flt(static_cast<float>(number));
     } else {
       reader.Problem(key.str(), "an item is text, an integer, a number with a point, or a table");
     }

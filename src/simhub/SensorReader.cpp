@@ -1,6 +1,7 @@
 // Reads the [sensor.KEY] sections of a scenario.
 #include <algorithm>
 
+#include "simhub/Protocol.h"
 #include "simhub/ScenarioReader.h"
 #include "simhub/SensorModels.h"
 
@@ -178,6 +179,10 @@ void readSensors(toml::table& table, std::vector<SensorConfig>* sensors, Problem
     TableReader reader(table, "sensor", problems);
     SensorConfig config;
     config.key = config.dataType = key;
+    if (key == kRegistryDataType || key == kSuidDataType) {
+      reader.Problem(key, "is a sensor of the hub's own");
+      continue;
+    }
     if (reader.Table(key) == nullptr || !resolveLike(table, key, 0, problems)) continue;
     readSensor(*table[key].as_table(), &config, problems);
     if (config.present) sensors->push_back(std::move(config));

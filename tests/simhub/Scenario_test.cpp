@@ -243,6 +243,10 @@ INSTANTIATE_TEST_SUITE_P(
         Mistake{"[registry.\"g.h\"]\nx = [1]\n",
                 "test.toml:2: registry.\"g.h\".x: an item is text, an integer, a number with a point, or a "
                 "table"},
+        Mistake{"[registry.g]\nx = 1e39\n",
+                "test.toml:2: registry.g.x: 1e+39 does not fit a single-precision float"},
+        Mistake{"[sensor.registry]\nname = \"r\"\n",
+                "test.toml:1: sensor.registry: is a sensor of the hub's own"},
         Mistake{"[fault.f]\nkind = \"silent\"\nsensor = \"s\"\n",
                 "test.toml:3: fault.f.sensor: there is no sensor \"s\""},
         Mistake{"[fault.f]\nkind = \"silent\"\ndelay = 3\n", "test.toml:3: fault.f.delay: unknown key"},
