@@ -80,7 +80,7 @@ class RealClock final : public Clock {
 /// `time` + `duration`, or the largest time when that would overflow. `duration` >= 0.
 template <class TimePoint>
 constexpr TimePoint saturatingAdd(TimePoint time, typename TimePoint::duration duration) {
-  if (duration > TimePoint::max() - time) return TimePoint::max();
+  if (time > TimePoint::max() - duration) return TimePoint::max();
   return time + duration;
 }
 
@@ -88,14 +88,13 @@ constexpr TimePoint saturatingAdd(TimePoint time, typename TimePoint::duration d
 /// not-a-number duration 0.
 template <class Rep, class Period>
 constexpr Clock::Duration saturatingNanoseconds(const std::chrono::duration<Rep, Period>& duration) {
-  using LongSeconds = std::chrono::duration<long double>;
-  const long double seconds = std::chrono::duration_cast<LongSeconds>(duration).count();
-  if (!(seconds == seconds)) return Clock::Duration::zero();
-  if (seconds >= std::chrono::duration_cast<LongSeconds>(Clock::Duration::max()).count())
-    return Clock::Duration::max();
-  if (seconds <= std::chrono::duration_cast<LongSeconds>(Clock::Duration::min()).count())
-    return Clock::Duration::min();
-  return std::chrono::duration_cast<Clock::Duration>(duration);
+  // A long double holds every 64-bit count exactly, and its range keeps the conversion from overflowing.
+  using LongNanoseconds = std::chrono::duration<long double, std::nano>;
+  const long double count = std::chrono::duration_cast<LongNanoseconds>(duration).count();
+  if (!(count == count)) return Clock::Duration::zero();
+  if (count >= LongNanoseconds(Clock::Duration::max()).count()) return Clock::Duration::max();
+  if (count <= LongNanoseconds(Clock::Duration::min()).count()) return Clock::Duration::min();
+  return Clock::Duration(static_cast<Clock::Duration::rep>(count));
 }
 
 }  // namespace ssc
