@@ -57,9 +57,11 @@ class Clock {
   /// Event thread: returns when events may happen (real time: at once), or after stopWaiting().
   virtual void awaitIdle() {}
   /// Event thread: the time up to which events may happen now.
-  [[nodiscard]] virtual TimePoint horizon() const { return TimePoint::max(); }
-  /// Event thread: nothing more happens up to the horizon.
+  [[nodiscard]] virtual TimePoint horizon() { return TimePoint::max(); }
+  /// Event thread: nothing more happens up to the horizon, as it was when it was last asked.
   virtual void horizonReached() {}
+  /// Any thread: the hub was asked for something, so that more may happen up to the horizon after all.
+  virtual void hubAsked() {}
   /// Any thread: ends awaitIdle() for good.
   virtual void stopWaiting() {}
 };

@@ -84,6 +84,7 @@ int Connection::SendRequest(Client* client, const std::string& request, Response
   lock.lock();
   if (result == kOk) result = awaitResponse(lock, pending);
   pending_.erase(transaction);
+  clock_->hubAsked();
   if (response != nullptr) *response = pending.response;
   return result;
 }

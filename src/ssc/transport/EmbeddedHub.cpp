@@ -23,26 +23,20 @@ bool SharedEmbeddedHub::RunUntil(Clock::TimePoint limit, Incoming* incoming) {
 }
 
 void SimulatedClock::wait(Condition& condition, std::unique_lock<std::mutex>& lock, Duration timeout) {
-  {
-    std::unique_lock<std::mutex> clockLock(mutex_);
-    const auto waiter = waiters_.insert(
-        waiters_.end(), Waiter{&condition, saturatingAdd(now(), std::max(timeout, Duration::zero())),
-                               std::this_thread::get_id() == eventThread_});
-    lock.unlock();  // after the waiter stands in the list, so that no notification is lost
-    block(waiter, clockLock);
-  }
+  block(&condition, timeout, &lock);
   lock.lock();
 }
 
-void SimulatedClock::sleepFor(Duration duration) {
+void SimulatedClock::sleepFor(Duration duration) { block(nullptr, duration, nullptr); }
+
+void SimulatedClock::block(const Condition* condition, Duration timeout,
+                           std::unique_lock<std::mutex>* alongside) {
   std::unique_lock<std::mutex> clockLock(mutex_);
   const auto waiter = waiters_.insert(
-      waiters_.end(), Waiter{nullptr, saturatingAdd(now(), std::max(duration, Duration::zero())),
+      waiters_.end(), Waiter{condition, saturatingAdd(now(), std::max(timeout, Duration::zero())),
                              std::this_thread::get_id() == eventThread_});
-  block(waiter, clockLock);
-}
-
-void SimulatedClock::block(std::list<Waiter>::iterator waiter, std::unique_lock<std::mutex>& clockLock) {
+  if (alongside != nullptr) alongside->unlock();  // now that no notification can be lost any more
+  ++changes_;
   changed_.notify_all();
   changed_.wait(clockLock,
                 [&] { return (waiter->woken && (eventThreadAtRest_ || waiter->onEventThread)) || stopped_; });
@@ -55,6 +49,13 @@ void SimulatedClock::notifyAll(Condition& condition) {
   for (Waiter& waiter : waiters_) {
     if (waiter.condition == &condition) waiter.woken = true;
   }
+  ++changes_;
+  changed_.notify_all();
+}
+
+void SimulatedClock::hubAsked() {
+  const std::lock_guard<std::mutex> guard(mutex_);
+  ++changes_;
   changed_.notify_all();
 }
 
@@ -72,8 +73,9 @@ void SimulatedClock::awaitIdle() {
   eventThreadAtRest_ = stopped_;
 }
 
-Clock::TimePoint SimulatedClock::horizon() const {
+Clock::TimePoint SimulatedClock::horizon() {
   const std::lock_guard<std::mutex> guard(mutex_);
+  changesAtHorizon_ = changes_;
   TimePoint earliest = TimePoint::max();
   for (const Waiter& waiter : waiters_) earliest = std::min(earliest, waiter.deadline);
   return earliest;
@@ -91,9 +93,9 @@ void SimulatedClock::horizonReached() {
     return;
   }
   // Nobody's deadline will ever come: only another thread can change anything.
-  const std::size_t waiting = waiters_.size();
   eventThreadAtRest_ = true;
-  changed_.wait(clockLock, [&] { return stopped_ || waiters_.size() != waiting || !mayRunEvents(); });
+  changed_.notify_all();
+  changed_.wait(clockLock, [&] { return stopped_ || changes_ != changesAtHorizon_; });
   eventThreadAtRest_ = false;
 }
 

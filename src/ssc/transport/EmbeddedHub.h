@@ -12,6 +12,7 @@
 
 #include <atomic>
 #include <condition_variable>
+#include <cstdint>
 #include <list>
 #include <memory>
 #include <mutex>
@@ -65,8 +66,9 @@ class SimulatedClock final : public Clock {
   void sleepFor(Duration duration) override;
 
   void awaitIdle() override;
-  [[nodiscard]] TimePoint horizon() const override;
+  [[nodiscard]] TimePoint horizon() override;
   void horizonReached() override;
+  void hubAsked() override;
   void stopWaiting() override;
 
  private:
@@ -77,14 +79,17 @@ class SimulatedClock final : public Clock {
     bool woken = false;
   };
 
-  /// Blocks the calling thread until its waiter is woken and the event thread is at rest.
-  void block(std::list<Waiter>::iterator waiter, std::unique_lock<std::mutex>& clockLock);
+  /// Blocks the calling thread until it is woken and the event thread is at rest. `alongside` is released
+  /// first, if given.
+  void block(const Condition* condition, Duration timeout, std::unique_lock<std::mutex>* alongside);
   [[nodiscard]] bool mayRunEvents() const;
 
   std::shared_ptr<SharedEmbeddedHub> hub_;
   mutable std::mutex mutex_;
   std::condition_variable changed_;
   std::list<Waiter> waiters_;
+  std::uint64_t changes_ = 0;           ///< counts whatever may let events happen again
+  std::uint64_t changesAtHorizon_ = 0;  ///< when the horizon was last asked
   std::thread::id eventThread_;
   bool eventThreadAtRest_ = false;
   bool stopped_ = false;
