@@ -15,7 +15,11 @@ class Clock;
 /// one.
 class Condition {
  public:
-  explicit Condition(Clock& clock) : clock_(clock) {}
+  /// When a waiter that is woken in simulated time goes on: after the event thread has come to rest, which
+  /// makes a run repeatable, or at once, for a waiter that a handler may be waiting for.
+  enum class Resume { kAfterEvents, kAtOnce };
+
+  explicit Condition(Clock& clock, Resume resume = Resume::kAfterEvents) : clock_(clock), resume_(resume) {}
   Condition(const Condition&) = delete;
   Condition& operator=(const Condition&) = delete;
 
@@ -24,7 +28,9 @@ class Condition {
 
  private:
   friend class RealClock;
+  friend class SimulatedClock;
   Clock& clock_;
+  const Resume resume_;
   std::condition_variable native_;
 };
 

@@ -32,7 +32,9 @@ std::unique_ptr<Connection> Connection::Over(HubLink link) {
 }
 
 Connection::Connection(HubLink link)
-    : clock_(std::move(link.clock)), transport_(std::move(link.transport)), changed_(*clock_) {
+    : clock_(std::move(link.clock)),
+      transport_(std::move(link.transport)),
+      changed_(*clock_, Condition::Resume::kAtOnce) {
   eventThread_ = std::thread([this] { runEventThread(); });
 }
 

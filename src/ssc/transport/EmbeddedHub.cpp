@@ -32,14 +32,16 @@ void SimulatedClock::sleepFor(Duration duration) { block(nullptr, duration, null
 void SimulatedClock::block(const Condition* condition, Duration timeout,
                            std::unique_lock<std::mutex>* alongside) {
   std::unique_lock<std::mutex> clockLock(mutex_);
+  const bool resumesAtOnce = std::this_thread::get_id() == eventThread_ ||
+                             (condition != nullptr && condition->resume_ == Condition::Resume::kAtOnce);
   const auto waiter = waiters_.insert(
-      waiters_.end(), Waiter{condition, saturatingAdd(now(), std::max(timeout, Duration::zero())),
-                             std::this_thread::get_id() == eventThread_});
+      waiters_.end(),
+      Waiter{condition, saturatingAdd(now(), std::max(timeout, Duration::zero())), resumesAtOnce});
   if (alongside != nullptr) alongside->unlock();  // now that no notification can be lost any more
   ++changes_;
   changed_.notify_all();
   changed_.wait(clockLock,
-                [&] { return (waiter->woken && (eventThreadAtRest_ || waiter->onEventThread)) || stopped_; });
+                [&] { return (waiter->woken && (eventThreadAtRest_ || waiter->resumesAtOnce)) || stopped_; });
   waiters_.erase(waiter);
   changed_.notify_all();
 }

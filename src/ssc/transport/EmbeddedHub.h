@@ -75,12 +75,11 @@ class SimulatedClock final : public Clock {
   struct Waiter {
     const Condition* condition;  ///< null: a sleeper, which nobody notifies
     TimePoint deadline;
-    bool onEventThread;
+    bool resumesAtOnce;
     bool woken = false;
   };
 
-  /// Blocks the calling thread until it is woken and the event thread is at rest. `alongside` is released
-  /// first, if given.
+  /// Blocks the calling thread until it is woken and may go on. `alongside` is released first, if given.
   void block(const Condition* condition, Duration timeout, std::unique_lock<std::mutex>* alongside);
   [[nodiscard]] bool mayRunEvents() const;
 
