@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+#include <google/protobuf/stubs/logging.h>
+
 #include "ssc/Client.h"
 #include "ssc/Log.h"
 #include "ssc/Results.h"
@@ -15,6 +17,11 @@ constexpr std::size_t kMaxSpare = 64;
 
 qmi::Bytes asBytes(const std::string& text) {
   return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
+}
+
+/// Keeps protobuf from writing to standard error: whoever parses says himself what did not parse.
+void silenceProtobuf() {
+  [[maybe_unused]] static const auto previous = google::protobuf::SetLogHandler(nullptr);
 }
 
 }  // namespace
@@ -35,6 +42,7 @@ Connection::Connection(HubLink link)
     : clock_(std::move(link.clock)),
       transport_(std::move(link.transport)),
       changed_(*clock_, Condition::Resume::kAtOnce) {
+  silenceProtobuf();
   eventThread_ = std::thread([this] { runEventThread(); });
 }
 
