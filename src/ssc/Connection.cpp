@@ -196,12 +196,19 @@ void Connection::sortReport(const qmi::Report& report) {
         delivery->recipients.push_back({client, state.registration});
       }
     }
+    sortByRegistration(&delivery->recipients);
   }
   if (delivery->recipients.empty()) {
     spare_.push_back(std::move(delivery));
   } else {
     queue_.push_back(std::move(delivery));
   }
+}
+
+void Connection::sortByRegistration(std::vector<Recipient>* recipients) {
+  std::sort(recipients->begin(), recipients->end(), [](const Recipient& left, const Recipient& right) {
+    return left.registration < right.registration;
+  });
 }
 
 void Connection::dropMalformed(const char* what) {
@@ -225,6 +232,7 @@ void Connection::connectionChanged(Incoming::Kind kind) {
   for (const auto& [client, state] : clients_) {
     if (state.registration != 0) delivery->recipients.push_back({client, state.registration});
   }
+  sortByRegistration(&delivery->recipients);
   queue_.push_back(std::move(delivery));
 }
 

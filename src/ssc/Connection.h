@@ -8,7 +8,7 @@
 // the event thread.
 //
 // Who gets an event: every client that was registered when the event came in, still is, and has ever sent a
-// request to the event's sensor.
+// request to the event's sensor; in the order of their registrations.
 #pragma once
 
 #include <cstdint>
@@ -102,6 +102,8 @@ class Connection {
   void sortIncoming(const Incoming& incoming);
   void sortResponse(const qmi::Response& response);
   void sortReport(const qmi::Report& report);
+  /// The clients stand in a map by address, which differs from run to run.
+  static void sortByRegistration(std::vector<Recipient>* recipients);
   void dropMalformed(const char* what);
   void connectionChanged(Incoming::Kind kind);
   [[nodiscard]] std::unique_ptr<Delivery> takeSpare();
