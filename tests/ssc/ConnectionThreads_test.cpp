@@ -114,6 +114,68 @@ TEST_P(ConnectionThreads, SendersThatHoldTheirMutexesDoNotHoldEachOtherUp) {
   for (std::thread& thread : threads) thread.join();
 }
 
+TEST_P(ConnectionThreads, ClientsComeAndGoWhileEventsPourIn) {
+  // Each request brings a burst of events around its response; the clients are gone before most are
+  // delivered.
+  const auto hub = rig([](const Request& request) {
+    return stream(kSensor, 20, 0ns, 0ns) + Outgoings{accept(request)} + stream(kSensor, 20, 0ns, 1us);
+  });
+  std::atomic<int> destroyed{0};
+  std::vector<std::thread> threads;
+  for (int i = 0; i < 3; ++i) {
+    threads.emplace_back([&] {
+      for (int round = 0; round < 100; ++round) {
+        auto client = std::make_unique<TestClient>(hub->connection());
+        // What a handler touches dies with the client: a handler that still runs would be seen.
+        auto touched = std::make_unique<int>(0);
+        client->onEvent = [value = touched.get()](const sns_client_event_msg&) { ++*value; };
+        client->Register();
+        EXPECT_EQ(client->SendRequest(Client::MakeConfigRequest(kSensor, 20, 0)), ssc::kOk);
+        EXPECT_TRUE(round % 2 == 0 || client->WaitForValues(1, kLong));
+        client->Unregister();
+        touched.reset();
+        client.reset();
+        ++destroyed;
+      }
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(destroyed, 300);
+}
+
+TEST_P(ConnectionThreads, UnregisteringWaitsForTheHandlerThatRuns) {
+  const auto hub =
+      rig([](const Request& request) { return Outgoings{accept(request)} + stream(kSensor, 1, 0ns, 0ns); });
+  // A handler that holds no mutex: nothing but the connection keeps it and the client apart.
+  class Slow : public Client {
+   public:
+    explicit Slow(ssc::Connection* hubConnection) : Client(hubConnection) {}
+    ~Slow() override { connection->UnregisterClient(this); }
+    void OnEvent(const sns_client_event_msg&) override {
+      {
+        const std::lock_guard<std::mutex> guard(mutex);
+        entered = true;
+        condition.notify_all();
+      }
+      for (int i = 0; i < 1000; ++i) std::this_thread::yield();
+      left = true;
+    }
+    void run() {
+      connection->RegisterClient(this);
+      EXPECT_EQ(SendRequest(MakeConfigRequest(kSensor, 20, 0)), ssc::kOk);
+      {
+        std::unique_lock<std::mutex> lock(mutex);
+        while (!entered) connection->clock().wait(condition, lock, kLong);
+      }
+      connection->UnregisterClient(this);
+      EXPECT_TRUE(left);
+    }
+    bool entered = false;
+    bool left = false;  // not guarded: the connection's promise is what orders it
+  };
+  for (int round = 0; round < 20; ++round) Slow(hub->connection()).run();
+}
+
 INSTANTIATE_TEST_SUITE_P(Links, ConnectionThreads, testing::Values(Link::kSimulated, Link::kSocket),
                          [](const auto& instance) {
                            return instance.param == Link::kSimulated ? "Simulated" : "Socket";
