@@ -180,6 +180,7 @@ void Connection::sortResponse(const qmi::Response& response) {
   const auto pending = pending_.find(response.transactionId);
   if (pending == pending_.end()) return;  // it came too late: its request has timed out
   PendingRequest& request = *pending->second;
+  if (request.done) return;
   request.response = {response.result, response.error, response.clientId, response.response};
   request.result = response.result == 0 ? kOk : kIoError;
   request.done = true;
@@ -223,6 +224,7 @@ void Connection::connectionChanged(Incoming::Kind kind) {
   up_ = up;
   if (!up) {
     for (auto& [transaction, request] : pending_) {
+      if (request->done) continue;  // answered, though its sender has not got to see it yet
       request->result = kNotConnected;
       request->done = true;
     }

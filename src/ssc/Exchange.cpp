@@ -34,7 +34,7 @@ void Exchange::OnEvent(const sns_client_event_msg& message) {
 
 void Exchange::OnDisconnect() {
   const std::lock_guard<std::mutex> guard(mutex);
-  finish(kNotConnected);
+  if (!done_) finish(kNotConnected);
 }
 
 void Exchange::finish(int result) {
