@@ -66,6 +66,9 @@ class Connection {
 
   [[nodiscard]] Clock& clock() { return *clock_; }
 
+  /// Held by whoever asks the hub for something that is answered by an event, until the answer.
+  [[nodiscard]] std::mutex& exchangeTurn() { return exchangeTurn_; }
+
   /// Datagrams that were dropped because they were malformed.
   [[nodiscard]] std::uint64_t malformedCount() const;
 
@@ -115,6 +118,8 @@ class Connection {
 
   const std::unique_ptr<Clock> clock_;
   const std::unique_ptr<Transport> transport_;
+
+  std::mutex exchangeTurn_;
 
   mutable std::mutex mutex_;  ///< guards all below; never held while a handler or a transport runs
   Condition changed_;

@@ -3,6 +3,7 @@
 namespace ssc {
 
 int Exchange::Run(const SensorUid& suid, const sns_client_request_msg& request, Matcher matcher) {
+  const std::lock_guard<std::mutex> turn(connection->exchangeTurn());
   connection->RegisterClient(this);
   std::unique_lock<std::mutex> lock(mutex);
   suid_ = suid;

@@ -9,6 +9,8 @@
 namespace ssc {
 
 /// A client for one request and the one event that answers it: what the library's own helpers are made of.
+/// The exchanges of a connection take turns, for most answers do not say what they answer. They are for the
+/// command's threads: a handler's would wait for an event that only its own return could deliver.
 class Exchange final : public Client {
  public:
   /// How long an answering event may take.
