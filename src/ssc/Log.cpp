@@ -25,12 +25,15 @@ constexpr std::array<const char*, 5> kLevelWords{"ERROR", "WARN", "INFO", "DEBUG
 constexpr const char* kSayWord = "SAY";
 constexpr mode_t kLogFileMode = 0644;
 
-/// The log file. Lines come in pieces; each whole line gets its time stamp when its newline arrives.
+/// The log file. Lines come in pieces; each whole line gets its time stamp when its newline arrives, or when
+/// text of another level word cuts it short.
 class LogFile {
  public:
   int open(const std::string& path) {
     close();
-    const int fd = ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW, kLogFileMode);
+    // O_NONBLOCK: a pipe that nobody reads is refused instead of waited for.
+    constexpr int kFlags = O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK;
+    const int fd = ::open(path.c_str(), kFlags, kLogFileMode);
     if (fd < 0) return -errno;
     file_ = ::fdopen(fd, "a");
     if (file_ == nullptr) {
@@ -44,7 +47,7 @@ class LogFile {
 
   void close() {
     if (file_ == nullptr) return;
-    if (!pending_.empty()) addLines(kSayWord, "\n");
+    if (!pending_.empty()) writeLine();
     std::fclose(file_);
     file_ = nullptr;
   }
@@ -55,29 +58,33 @@ class LogFile {
 
   void addLines(const char* word, std::string_view text) {
     if (file_ == nullptr) return;
+    if (!pending_.empty() && pendingWord_ != word) writeLine();
+    pendingWord_ = word;
     while (!text.empty()) {
       const std::size_t end = text.find('\n');
       pending_.append(text.substr(0, end));
       if (end == std::string_view::npos) return;
-      writeLine(word);
+      writeLine();
       text.remove_prefix(end + 1);
     }
   }
 
  private:
-  void writeLine(const char* word) {
+  void writeLine() {
     std::timespec now{};
     std::timespec_get(&now, TIME_UTC);
     std::tm utc{};
     gmtime_r(&now.tv_sec, &utc);
     std::array<char, 32> stamp{};
     std::strftime(stamp.data(), stamp.size(), "%Y-%m-%d %H:%M:%S", &utc);
-    std::fprintf(file_, "%s.%03ldZ %-7s %s\n", stamp.data(), now.tv_nsec / 1'000'000, word, pending_.c_str());
+    std::fprintf(file_, "%s.%03ldZ %-7s %s\n", stamp.data(), now.tv_nsec / 1'000'000, pendingWord_,
+                 pending_.c_str());
     pending_.clear();
   }
 
   std::FILE* file_ = nullptr;
-  std::string pending_;
+  std::string pending_;           ///< of the line that is not finished
+  const char* pendingWord_ = "";  ///< one of the constants above
 };
 
 struct LogState {
@@ -167,7 +174,7 @@ void fsay(const char* format, ...) {
 }
 
 void log(int level, const char* format, ...) {
-  if (level > logLevel()) return;
+  if (level > std::max(logLevel(), kLogError)) return;
   std::va_list arguments;
   va_start(arguments, format);
   std::string text = formatText(format, arguments);
