@@ -23,7 +23,8 @@ constexpr const char* kHowToChoose =
 int openUnixLink(const std::string& path, HubLink* link) {
   const int result = UnixTransport::Connect(path, &link->transport);
   if (result == kInvalid) {
-    log(kLogError, "The socket path in VANTLE_HUB is empty or too long: \"%s\"", path.c_str());
+    log(kLogError, "The socket path in VANTLE_HUB is empty or too long: \"%s\". %s", path.c_str(),
+        kHowToChoose);
   } else if (result != kOk) {
     log(kLogError, "No sensor hub listens on the socket \"%s\". %s", path.c_str(), kHowToChoose);
   } else {
