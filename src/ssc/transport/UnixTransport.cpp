@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <cstring>
 
+#include <poll.h>
 #include <sys/un.h>
 
 #include "ssc/Results.h"
@@ -35,8 +36,7 @@ int UnixTransport::Connect(const std::string& path, std::unique_ptr<Transport>* 
 UnixTransport::UnixTransport(std::string path, Descriptor socket)
     : path_(std::move(path)),
       socket_(std::move(socket)),
-      buffers_(new std::array<std::array<std::uint8_t, kMaxDatagram>, kBatch>) {
-}  // uninitialised on purpose: 1 MiB
+      buffers_(new Buffers) {}  // uninitialised on purpose: 1 MiB
 
 Descriptor UnixTransport::connectTo(const std::string& path) {
   sockaddr_un address{};
@@ -74,26 +74,32 @@ int UnixTransport::Send(qmi::Bytes datagram) {
   }
 }
 
+bool UnixTransport::hungUp() const {
+  pollfd polled{socket_.get(), POLLRDHUP, 0};
+  return ::poll(&polled, 1, 0) > 0;
+}
+
 bool UnixTransport::takeDatagram(Incoming* incoming) {
   if (batchNext_ == batchSize_) {
     std::array<mmsghdr, kBatch> messages{};
     std::array<iovec, kBatch> vectors{};
     for (std::size_t i = 0; i < kBatch; ++i) {
-      vectors[i] = {(*buffers_)[i].data(), kMaxDatagram};
+      vectors[i] = {(*buffers_)[i].data(), (*buffers_)[i].size()};
       messages[i].msg_hdr.msg_iov = &vectors[i];
       messages[i].msg_hdr.msg_iovlen = 1;
     }
     batchNext_ = batchSize_ = 0;
     const int count = ::recvmmsg(socket_.get(), messages.data(), kBatch, MSG_DONTWAIT, nullptr);
     if (count < 0) {
-      lost_ = errno != EAGAIN && errno != EINTR;
+      // A hub that went away with requests unread resets the connection; what it sent before is still there.
+      lost_ = errno != EAGAIN && errno != EINTR && errno != ECONNRESET;
       return false;
     }
-    // A packet of no bytes is the end of the connection: QMI has no empty messages.
-    const auto end = std::find_if(messages.begin(), messages.begin() + count,
-                                  [](const mmsghdr& message) { return message.msg_len == 0; });
-    lost_ = end != messages.begin() + count;
-    batchSize_ = static_cast<std::size_t>(end - messages.begin());
+    batchSize_ = static_cast<std::size_t>(count);
+    // From the end of the connection on every message has no bytes, so that the batch is full of them. A
+    // packet of no bytes, which is a malformed datagram, looks the same but for the hub being there.
+    lost_ = batchSize_ == kBatch && messages.back().msg_len == 0 && hungUp();
+    while (lost_ && batchSize_ > 0 && messages[batchSize_ - 1].msg_len == 0) --batchSize_;
     for (std::size_t i = 0; i < batchSize_; ++i) lengths_[i] = messages[i].msg_len;
     if (batchSize_ == 0) return false;
   }

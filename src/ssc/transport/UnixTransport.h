@@ -37,6 +37,8 @@ class UnixTransport final : public Transport {
   /// Moves the next datagram of the batch into `incoming`; reads a new batch when the last is used up. False:
   /// none now.
   [[nodiscard]] bool takeDatagram(Incoming* incoming);
+  /// Whether the hub has ended the connection; packets of before may still be there.
+  [[nodiscard]] bool hungUp() const;
   void goDown();
 
   const std::string path_;
@@ -47,7 +49,9 @@ class UnixTransport final : public Transport {
   RealClock clock_;
   Clock::TimePoint nextAttempt_{};
 
-  std::unique_ptr<std::array<std::array<std::uint8_t, kMaxDatagram>, kBatch>> buffers_;
+  /// One byte more than a datagram may have: a longer packet, which is cut to this, is seen to be too long.
+  using Buffers = std::array<std::array<std::uint8_t, kMaxDatagram + 1>, kBatch>;
+  std::unique_ptr<Buffers> buffers_;
   std::array<std::size_t, kBatch> lengths_{};
   std::size_t batchSize_ = 0;
   std::size_t batchNext_ = 0;
