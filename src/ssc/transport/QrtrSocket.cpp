@@ -1,6 +1,9 @@
 #include "ssc/transport/QrtrSocket.h"
 
+#include <algorithm>
 #include <cerrno>
+#include <chrono>
+#include <utility>
 
 #include <linux/qrtr.h>
 #include <sys/ioctl.h>
@@ -13,6 +16,9 @@ namespace {
 
 /// A full queue loses packets for good, the one that says that the hub went away among them.
 constexpr int kReceiveBuffer = 4 * 1024 * 1024;
+
+/// Between one failure to receive and the next.
+constexpr std::chrono::milliseconds kFailurePause{100};
 
 sockaddr_qrtr socketAddress(const QrtrAddress& address) {
   sockaddr_qrtr result{};
@@ -63,7 +69,8 @@ class KernelSocket final : public QrtrSocket {
       message.msg_iovlen = 1;
       const ssize_t length = ::recvmsg(socket_.get(), &message, MSG_DONTWAIT);
       if (length < 0 && (errno == EAGAIN || errno == EINTR)) continue;
-      if (length < 0) return Outcome::kFailed;
+      if (length < 0) return failed(deadline);
+      failedBefore_ = false;
       if ((message.msg_flags & MSG_TRUNC) != 0) continue;
       packet->resize(static_cast<std::size_t>(length));
       *from = {address.sq_node, address.sq_port};
@@ -74,7 +81,20 @@ class KernelSocket final : public QrtrSocket {
   void Interrupt() override { interrupt_.Signal(); }
 
  private:
+  /// A socket that goes on failing must neither keep a processor busy nor the caller beyond its deadline.
+  [[nodiscard]] Outcome failed(Clock::TimePoint deadline) {
+    if (!std::exchange(failedBefore_, true)) return Outcome::kFailed;
+    const auto pause = saturatingAdd(RealClock().now(), Clock::Duration(kFailurePause));
+    switch (interrupt_.WaitReadable(-1, std::min(deadline, pause))) {
+      case Interrupter::Woken::kInterrupted:
+        return Outcome::kInterrupted;
+      default:
+        return RealClock().now() >= deadline ? Outcome::kDeadline : Outcome::kFailed;
+    }
+  }
+
   Descriptor socket_;
+  bool failedBefore_ = false;
   std::uint32_t node_;
   Interrupter interrupt_;
 };

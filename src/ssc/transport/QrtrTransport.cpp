@@ -11,9 +11,9 @@
 namespace ssc {
 namespace {
 
-std::vector<std::uint8_t> lookupPacket() {
+std::vector<std::uint8_t> lookupPacket(std::uint32_t command) {
   qrtr_ctrl_pkt packet{};
-  packet.cmd = htole32(QRTR_TYPE_NEW_LOOKUP);
+  packet.cmd = htole32(command);
   packet.server.service = htole32(qmi::kHubServiceId);
   packet.server.instance = 0;  // any
   const auto* bytes = reinterpret_cast<const std::uint8_t*>(&packet);
@@ -35,9 +35,19 @@ int QrtrTransport::ConnectOver(std::unique_ptr<QrtrSocket> socket, const Clock& 
   return kOk;
 }
 
+int QrtrTransport::armLookup() {
+  return socket_->Send({socket_->LocalNode(), QRTR_PORT_CTRL}, lookupPacket(QRTR_TYPE_NEW_LOOKUP));
+}
+
+int QrtrTransport::rearmLookup() {
+  // One that is still armed would announce every server twice.
+  const int result =
+      socket_->Send({socket_->LocalNode(), QRTR_PORT_CTRL}, lookupPacket(QRTR_TYPE_DEL_LOOKUP));
+  return result != 0 ? result : armLookup();
+}
+
 bool QrtrTransport::discover(Clock::TimePoint deadline) {
-  // The look-up stays armed: the name service goes on telling of servers that go and come.
-  if (socket_->Send({socket_->LocalNode(), QRTR_PORT_CTRL}, lookupPacket()) != 0) return false;
+  if (armLookup() != 0) return false;
   QrtrAddress from;
   std::vector<std::uint8_t> packet;
   while (!listEnded_) {
@@ -45,12 +55,13 @@ bool QrtrTransport::discover(Clock::TimePoint deadline) {
     if (from.port == QRTR_PORT_CTRL) handleControl(packet);
   }
   changes_.clear();
-  return server_.has_value();
+  return !servers_.empty();
 }
 
 std::optional<QrtrAddress> QrtrTransport::server() const {
   const std::lock_guard<std::mutex> guard(mutex_);
-  return server_;
+  if (servers_.empty()) return std::nullopt;
+  return servers_.front();
 }
 
 int QrtrTransport::Send(qmi::Bytes datagram) {
@@ -66,7 +77,7 @@ int QrtrTransport::Send(qmi::Bytes datagram) {
       // The port is dead although nothing said so: a notice that was lost.
       {
         const std::lock_guard<std::mutex> guard(mutex_);
-        if (server_ == to) serverGone();
+        forgetServers([&](const QrtrAddress& address) { return address == *to; });
       }
       socket_->Interrupt();
       return kNotConnected;
@@ -96,9 +107,12 @@ Transport::Outcome QrtrTransport::Receive(Clock::TimePoint deadline, Incoming* i
         break;
       }
       case QrtrSocket::Outcome::kFailed: {
-        const std::lock_guard<std::mutex> guard(mutex_);
-        if (!server_) return Outcome::kInterrupted;
-        serverGone();
+        // The name service has restarted and forgotten who listens; what it knew may be true no longer.
+        {
+          const std::lock_guard<std::mutex> guard(mutex_);
+          forgetServers([](const QrtrAddress&) { return true; });
+        }
+        [[maybe_unused]] const int ignored = rearmLookup();  // or else at the next failure
         break;
       }
       case QrtrSocket::Outcome::kPacket:
@@ -129,10 +143,11 @@ void QrtrTransport::handleControl(qmi::Bytes bytes) {
       }
       break;
     case QRTR_TYPE_DEL_SERVER:
-      if (service == qmi::kHubServiceId && server_ == address) serverGone();
+      if (service != qmi::kHubServiceId) break;
+      forgetServers([&](const QrtrAddress& known) { return known == address; });
       break;
     case QRTR_TYPE_BYE:
-      if (server_ && server_->node == le32toh(packet.client.node)) serverGone();
+      forgetServers([&](const QrtrAddress& known) { return known.node == le32toh(packet.client.node); });
       break;
     default:
       break;
@@ -140,16 +155,20 @@ void QrtrTransport::handleControl(qmi::Bytes bytes) {
 }
 
 void QrtrTransport::serverAppeared(const QrtrAddress& address) {
-  if (server_ && !(*server_ == address)) return;  // a second hub: the first that was found stays
   // The same server again: it has restarted, and the notice that it went was lost.
-  if (server_) serverGone();
-  server_ = address;
-  changes_.push_back(Incoming::Kind::kUp);
+  forgetServers([&](const QrtrAddress& known) { return known == address; });
+  servers_.push_back(address);
+  if (servers_.size() == 1) changes_.push_back(Incoming::Kind::kUp);
 }
 
-void QrtrTransport::serverGone() {
-  server_.reset();
+template <class Predicate>
+void QrtrTransport::forgetServers(Predicate forget) {
+  if (servers_.empty()) return;
+  const bool current = forget(servers_.front());
+  std::erase_if(servers_, forget);
+  if (!current) return;
   changes_.push_back(Incoming::Kind::kDown);
+  if (!servers_.empty()) changes_.push_back(Incoming::Kind::kUp);
 }
 
 }  // namespace ssc

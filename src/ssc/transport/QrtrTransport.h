@@ -6,6 +6,7 @@
 #include <memory>
 #include <mutex>
 #include <optional>
+#include <vector>
 
 #include "ssc/transport/QrtrSocket.h"
 #include "ssc/transport/Transport.h"
@@ -31,13 +32,18 @@ class QrtrTransport final : public Transport {
   explicit QrtrTransport(std::unique_ptr<QrtrSocket> socket) : socket_(std::move(socket)) {}
   [[nodiscard]] bool discover(Clock::TimePoint deadline);
   void handleControl(qmi::Bytes packet);
+  /// Asks the name service for the servers that are there and, from then on, for those that go and come.
+  [[nodiscard]] int armLookup();
+  [[nodiscard]] int rearmLookup();
   void serverAppeared(const QrtrAddress& address);
-  void serverGone();
+  /// If the hub is among those forgotten, the next server takes its place.
+  template <class Predicate>
+  void forgetServers(Predicate forget);
   [[nodiscard]] std::optional<QrtrAddress> server() const;
 
   const std::unique_ptr<QrtrSocket> socket_;
   mutable std::mutex mutex_;            ///< guards the following
-  std::optional<QrtrAddress> server_;   ///< nothing while the hub is away
+  std::vector<QrtrAddress> servers_;    ///< of the service; the first is the hub, none: it is away
   std::deque<Incoming::Kind> changes_;  ///< that Receive has yet to tell
   bool listEnded_ = false;
 };
