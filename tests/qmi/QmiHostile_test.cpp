@@ -209,7 +209,7 @@ TEST(QmiDecode, CountThatDoesNotFillItsTlvIsRefused) {
 
 TEST(QmiDecode, RequestWithoutAReportTypeAcceptsSmallReportsOnly) {
   Datagram datagram = requestDatagram();
-  datagram.resize(datagram.size() - 4);
+  datagram.erase(datagram.end() - 4, datagram.end());
   setLength(&datagram);
   const auto request = qmi::decodeRequest(datagram);
   ASSERT_TRUE(request.has_value());
