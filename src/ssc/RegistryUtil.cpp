@@ -63,7 +63,11 @@ int RegistryUtil::lookup() {
   std::vector<SensorUid> suids;
   SuidUtil suidUtil(connection_);
   const int result = suidUtil.Lookup(kRegistryDataType, &suids);
-  if (result == kOk) registry_ = suids.front();
+  if (result == kOk) {
+    registry_ = suids.front();
+  } else {
+    log(kLogError, "Unable to find the hub's registry. Error = %d", result);
+  }
   return result;
 }
 

@@ -81,6 +81,7 @@ bool UnixTransport::hungUp() const {
 
 bool UnixTransport::takeDatagram(Incoming* incoming) {
   if (batchNext_ == batchSize_) {
+    if (drained_) return false;
     std::array<mmsghdr, kBatch> messages{};
     std::array<iovec, kBatch> vectors{};
     for (std::size_t i = 0; i < kBatch; ++i) {
@@ -93,9 +94,11 @@ bool UnixTransport::takeDatagram(Incoming* incoming) {
     if (count < 0) {
       // A hub that went away with requests unread resets the connection; what it sent before is still there.
       lost_ = errno != EAGAIN && errno != EINTR && errno != ECONNRESET;
+      drained_ = errno == EAGAIN;
       return false;
     }
     batchSize_ = static_cast<std::size_t>(count);
+    drained_ = batchSize_ < kBatch;  // what has come since, the next wait tells at once
     // From the end of the connection on every message has no bytes, so that the batch is full of them. A
     // packet of no bytes, which is a malformed datagram, looks the same but for the hub being there.
     lost_ = batchSize_ == kBatch && messages.back().msg_len == 0 && hungUp();
@@ -133,6 +136,7 @@ Transport::Outcome UnixTransport::Receive(Clock::TimePoint deadline, Incoming* i
       if (socket.valid()) {
         const std::lock_guard<std::mutex> guard(mutex_);
         socket_ = std::move(socket);
+        drained_ = false;
         incoming->kind = Incoming::Kind::kUp;
         incoming->datagram.clear();
         return Outcome::kIncoming;
@@ -148,6 +152,7 @@ Transport::Outcome UnixTransport::Receive(Clock::TimePoint deadline, Incoming* i
         if (clock_.now() >= deadline) return Outcome::kDeadline;
         break;
       case Interrupter::Woken::kReady:
+        drained_ = false;
         break;
     }
   }

@@ -55,6 +55,7 @@ class UnixTransport final : public Transport {
   std::array<std::size_t, kBatch> lengths_{};
   std::size_t batchSize_ = 0;
   std::size_t batchNext_ = 0;
+  bool drained_ = false;  ///< the last system call left nothing behind: wait before the next
 };
 
 }  // namespace ssc
