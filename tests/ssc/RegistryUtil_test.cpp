@@ -82,10 +82,13 @@ TEST_F(RegistryUtilTest, GroupThatDoesNotExistIsNotFoundAndSaidSo) {
   EXPECT_EQ(shown_.compare(0, 7, "ERROR: "), 0);
 }
 
-TEST_F(RegistryUtilTest, HubWithoutARegistryIsNotFound) {
+TEST_F(RegistryUtilTest, HubWithoutARegistryIsNotFoundAndSaidSo) {
   hub_.sensors.clear();
   EXPECT_EQ(readResult(), ssc::kNotFound);
+  EXPECT_EQ(shown_, "ERROR: Unable to find the hub's registry. Error = -2\n");
+  testing::internal::CaptureStderr();
   EXPECT_EQ(writeResult(), ssc::kNotFound);
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), shown_);
 }
 
 TEST_F(RegistryUtilTest, ReadWithoutAnAnswerTimesOut) {
