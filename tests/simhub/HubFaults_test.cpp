@@ -31,8 +31,7 @@ std::vector<std::string> fault(const std::vector<std::string>& keys) {
 /// A hub with the fault whose barometer streams for a second at 10 Hz.
 class Streaming {
  public:
-  explicit Streaming(const std::vector<std::string>& keys)
-      : hub(fault(std::move(keys))), suid(hub.Find("pressure")) {
+  explicit Streaming(const std::vector<std::string>& keys) : hub(fault(keys)), suid(hub.Find("pressure")) {
     hub.Configure(suid, 10);
     hub.Run(1.01);
   }
