@@ -102,7 +102,8 @@ int BaroCalibrator::LookupSuids() {
   const int result = LookupSuidsByName({kPressure, kTemperature}, &suids, &packageName_,
                                        SNS_STD_SENSOR_STREAM_TYPE_STREAMING);
   if (result != ssc::kOk) {
-    ssc::log(ssc::kLogError, "Unable to look up the barometer and its temperature sensor. Error = %d", result);
+    ssc::log(ssc::kLogError, "Unable to look up the barometer and its temperature sensor. Error = %d",
+             result);
     return result;
   }
   pressureSuid_ = suids[kPressure];

@@ -10,7 +10,6 @@ using golden::differenceOf;
 using golden::Result;
 using golden::sameStatus;
 using testing::HasSubstr;
-using testing::Not;
 
 /// A run that states everything, and a result that is just as stated.
 struct Fulfilled {

@@ -14,7 +14,6 @@ using simhub::kSensorEvent;
 using simhub::Suid;
 using simhub::Time;
 using testing::Contains;
-using testing::Each;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
@@ -23,7 +22,7 @@ using testing::SizeIs;
 constexpr const char* kGroup = "barochip_0_platform.pressure.fac_cal";
 
 /// Overrides for one fault named f, the sensor without noise.
-std::vector<std::string> fault(std::vector<std::string> keys) {
+std::vector<std::string> fault(const std::vector<std::string>& keys) {
   std::vector<std::string> overrides{"sensor.pressure.noise=0", "sensor.pressure.settling_ms=0"};
   for (const std::string& key : keys) overrides.push_back("fault.f." + key);
   return overrides;
@@ -32,8 +31,7 @@ std::vector<std::string> fault(std::vector<std::string> keys) {
 /// A hub with the fault whose barometer streams for a second at 10 Hz.
 class Streaming {
  public:
-  explicit Streaming(std::vector<std::string> keys)
-      : hub(fault(std::move(keys))), suid(hub.Find("pressure")) {
+  explicit Streaming(const std::vector<std::string>& keys) : hub(fault(keys)), suid(hub.Find("pressure")) {
     hub.Configure(suid, 10);
     hub.Run(1.01);
   }

@@ -9,7 +9,6 @@
 namespace {
 
 using simhub::Signal;
-using simhub::SignalMove;
 using simhub::SignalValue;
 using Shape = simhub::SignalMove::Shape;
 
