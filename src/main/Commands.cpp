@@ -2,11 +2,20 @@
 
 #include <string_view>
 
+#include "light/AlsCalibrator.h"
 #include "mag/BaroCalibrator.h"
+#include "prox/ProxCalibrator.h"
 
 namespace {
 
 bool anyDevice(DeviceType) { return true; }
+
+/// The light sensor looks past the display, not through it.
+bool hasClassicAmbientLight(DeviceType type) {
+  return type != DeviceType::t5h5 && type != DeviceType::rufael && type != DeviceType::whiskel;
+}
+
+bool hasProximityThresholds(DeviceType type) { return type == DeviceType::o1v1; }
 
 template <class Command>
 std::unique_ptr<Calibrator> make(ssc::Connection* connection) {
@@ -22,7 +31,9 @@ struct Command {
 // One row for each calibrator; of a command with variants the first that serves the device counts. The word
 // is compared as it stands, capitals included.
 constexpr Command kCommands[] = {
+    {"als", hasClassicAmbientLight, make<AlsCalibrator>},
     {"baro", anyDevice, make<BaroCalibrator>},
+    {"prox", hasProximityThresholds, make<ProxCalibrator>},
 };
 
 }  // namespace

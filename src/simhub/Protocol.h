@@ -28,6 +28,7 @@ inline constexpr std::uint32_t kOnChangeConfigRequest = 514;
 inline constexpr std::uint32_t kTestRequest = 515;
 inline constexpr std::uint32_t kCalibrationChangedRequest = 610;
 inline constexpr std::uint32_t kSensorEvent = 1025;
+inline constexpr std::uint32_t kProximityEvent = 769;  // of a proximity sensor, instead of the sensor event
 inline constexpr std::uint32_t kTestEvent = 1026;
 inline constexpr std::uint32_t kCalibrationChangedReply = 1110;
 

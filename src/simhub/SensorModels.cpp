@@ -1,6 +1,8 @@
 #include "simhub/SensorModels.h"
 
+#include "simhub/sensors/AmbientLight.h"
 #include "simhub/sensors/Barometer.h"
+#include "simhub/sensors/Proximity.h"
 #include "simhub/sensors/Thermometer.h"
 
 namespace simhub {
@@ -11,12 +13,31 @@ std::unique_ptr<Sensor> make(const SensorConfig& config, const SensorSurrounding
   return std::make_unique<Model>(config, surroundings);
 }
 
+constexpr SensorParameter kAmbientLightParameters[] = {
+    {"color_temperature_slope", 1, 1, -1, 1, 0,
+     "Share by which light is seen brighter per 1000 K above 5000 K."},
+    {"infrared_leak", 1, 1, 0, 10, 0, "Share by which light of nothing but infrared is seen brighter."},
+    {"corrects", 1, 1, 0, 1, 0,
+     "1: the calibrated stream is also multiplied by the registry's \"corr_factor\"."},
+};
+
+constexpr SensorParameter kProximityParameters[] = {
+    {"reference_distance", 1, 1, 1, 10000, 50, "Distance of a target, in mm, at which it throws back"},
+    {"reference_counts", 1, 1, 0, 65535, 140, "this much light, in counts."},
+};
+
 constexpr SensorModel kModels[] = {
+    {"ambient_light", "_0_platform.als.fac_cal", kAmbientLightParameters, make<AmbientLight>,
+     "One value, the illuminance in lux. Calibration: multiplied by \"scale\" / 1000."},
     {"barometer",
      "_0_platform.pressure.fac_cal",
      {},
      make<Barometer>,
      "One value, the air pressure in hPa. Calibration: the first number of \"bias\" is subtracted."},
+    {"proximity", "_0_platform.prox.fac_cal", kProximityParameters, make<Proximity>,
+     "Proximity events of raw counts, 0 to 255, and the reading before it is cut to counts. Calibration: "
+     "near from "
+     "\"near_threshold\" on, far from \"far_threshold\" down."},
     {"temperature", "", {}, make<Thermometer>, "One value, the chip's temperature in °C."},
 };
 

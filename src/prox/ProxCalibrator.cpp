@@ -1,0 +1,248 @@
+#include "prox/ProxCalibrator.h"
+
+#include <array>
+#include <cstring>
+
+#include "framework/CommandOptions.h"
+#include "framework/ParseNumber.h"
+#include "framework/RegistryItems.h"
+#include "ssc/AttrUtil.h"
+#include "ssc/Log.h"
+#include "ssc/RegistryUtil.h"
+#include "ssc/Ticks.h"
+
+namespace {
+
+constexpr const char* kUsage = "Usage: vantle prox [-h] [-s SAMPLES] [near | far]\n";
+// "Five (5)" is an old slip that stays, the default being ten: scripts compare this text.
+constexpr const char* kOptions = R"(Options:
+  -h           Print this help and exit.
+  -s SAMPLES   Specify the number of samples to collect. Five (5) samples are
+                 collected by default.
+Arguments:
+  near         Perform calibration for the near threshold. If no argument is
+                 given, this is the default mode.
+  far          Perform calibration for the far threshold.
+
+)";
+
+constexpr const char* kGroupSuffix = "_0_platform.prox.fac_cal";
+
+/// What one mode calls its threshold.
+struct ThresholdNames {
+  const char* printed;
+  const char* item;  ///< a float item: raw counts
+};
+constexpr ThresholdNames kNear{"NEAR", "near_threshold"};
+constexpr ThresholdNames kFar{"FAR", "far_threshold"};
+
+constexpr const ThresholdNames& namesOf(ProximityMode mode) {
+  return mode == ProximityMode::kNear ? kNear : kFar;
+}
+constexpr const ThresholdNames& otherNamesOf(ProximityMode mode) {
+  return mode == ProximityMode::kNear ? kFar : kNear;
+}
+
+// What a reset stores.
+constexpr float kDefaultNearThreshold = 140.0F;
+constexpr float kDefaultFarThreshold = 100.0F;
+
+constexpr const char* kProximity = "proximity";
+/// A sensor's own event id: the registry sensor's write event has the same number.
+constexpr std::uint32_t kProximityEvent = 769;
+constexpr std::int32_t kRateHz = 50;
+/// Beyond what the samples themselves take: the sensor needs a while to become accurate.
+constexpr std::int32_t kExtraSeconds = 3;
+
+constexpr std::int32_t kDefaultSamples = 10;
+constexpr float kDefaultRangeHigh = 5.0F;
+
+}  // namespace
+
+ProxCalibrator::ProxCalibrator(ssc::Connection* hubConnection)
+    : Calibrator(hubConnection, kUsage, kOptions) {}
+
+int ProxCalibrator::Run(const Arguments& arguments) {
+  if (arguments.reset) return Reset();
+  int result = ParseArgs(arguments);
+  if (result == kHelpPrinted) return ssc::kOk;
+  if (result == ssc::kOk) result = LookupSuid();
+  return result == ssc::kOk ? Calibrate() : result;
+}
+
+int ProxCalibrator::ParseArgs(const Arguments& arguments) {
+  rangeHigh_ = kDefaultRangeHigh;
+  mode_ = ProximityMode::kNear;
+  sampleCount_ = kDefaultSamples;
+  CopyGlobalOptions(arguments);
+
+  CommandOptions options(arguments, "hs:");
+  for (int option; (option = options.Next()) != CommandOptions::kEnd;) {
+    switch (option) {
+      case 'h':
+        PrintUsage(false);
+        return kHelpPrinted;
+      case 's':
+        if (parseInt(options.argument(), &sampleCount_) != ssc::kOk || sampleCount_ < 1) {
+          return UsageError("SAMPLES must be a positive integer");
+        }
+        break;
+      default:
+        return InvalidOption(arguments, option);
+    }
+  }
+
+  const auto& words = options.words();
+  if (words.empty()) return ssc::kOk;
+  if (std::strcmp(words[0], "far") == 0) {
+    mode_ = ProximityMode::kFar;
+  } else if (std::strcmp(words[0], "near") != 0) {
+    return UsageError("Invalid argument '%s'", words[0]);
+  }
+  IgnoreExtraArguments(words, 1);
+  return ssc::kOk;
+}
+
+int ProxCalibrator::LookupSuid() {
+  if (!suid_.IsZero() && !sensorName_.empty()) return ssc::kOk;
+  ssc::say("Searching for proximity sensor...\n");
+  std::map<std::string, ssc::SensorUid> suids;
+  const int result =
+      LookupSuidsByName({kProximity}, &suids, &sensorName_, SNS_STD_SENSOR_STREAM_TYPE_STREAMING);
+  if (result != ssc::kOk) {
+    ssc::log(ssc::kLogError, "Unable to lookup streaming proximity sensor");
+    return result;
+  }
+  suid_ = suids[kProximity];
+  SetSensorInfo(suid_, "Proximity", static_cast<float>(kRateHz));
+
+  // The range only says which distance is printed for a far target: without it the default does.
+  sns_std_attr_event attributes;
+  if (ssc::AttrUtil(connection).LoadAttributes(suid_, &attributes) == ssc::kOk) {
+    float low = 0;
+    float high = 0;
+    if (ssc::AttrUtil::GetSelectedRange(attributes, &low, &high) == ssc::kOk) rangeHigh_ = high;
+  }
+  return ssc::kOk;
+}
+
+std::string ProxCalibrator::groupName() const { return sensorName_ + kGroupSuffix; }
+
+void ProxCalibrator::OnEvent(const sns_client_event_msg& message) {
+  constexpr const char* kFunction = "virtual void ProxCalibrator::OnEvent(const sns_client_event_msg &)";
+  ssc::logFunc(kFunction, "-->");
+  const std::lock_guard<std::mutex> guard(mutex);
+  if (takeEvents(message)) condition.notify_all();
+  ssc::logFunc(kFunction, "<--");
+}
+
+bool ProxCalibrator::takeEvents(const sns_client_event_msg& message) {
+  if (ssc::SensorUid(message.suid()) != suid_ || hasEnoughSamples()) return false;
+  float distance = 0;  // what a near target counts as, until a far event of the same message
+  for (const auto& event : message.events()) {
+    if (event.msg_id() != kProximityEvent) continue;
+    if (!event_.ParseFromString(event.payload())) {
+      // Fails the collection, but does not end it before its time or count.
+      ssc::log(ssc::kLogError, "Received malformed proximity event");
+      status = ssc::kMalformed;
+      continue;
+    }
+    if (event_.proximity_event_type() == SNS_PROXIMITY_EVENT_TYPE_FAR) distance = rangeHigh_;
+    if (event_.status() != SNS_STD_SENSOR_SAMPLE_STATUS_ACCURACY_HIGH) {
+      ssc::log(ssc::kLogDebug, "Dropping proximity sample (%d)", event_.status());
+      continue;
+    }
+    const std::array<float, 3> values{static_cast<float>(event_.raw_adc()), distance,
+                                      event_.data_size() > 0 ? event_.data(0) : 0.0F};
+    samples[suid_].emplace_back(ssc::ticksToSeconds(event.timestamp()), values.begin(), values.end());
+    if (hasEnoughSamples()) return true;
+  }
+  return false;
+}
+
+bool ProxCalibrator::hasEnoughSamples() const {
+  const auto collected = samples.find(suid_);
+  return collected != samples.end() && collected->second.size() >= static_cast<std::size_t>(sampleCount_);
+}
+
+int ProxCalibrator::Calibrate() {
+  ssc::say("Proximity calibration begins.\n");
+  return Conclude("Proximity sensor calibration", measureAndStore());
+}
+
+int ProxCalibrator::measureAndStore() {
+  const int result = collect();
+  if (result != ssc::kOk) return result;
+  const float threshold = proximityThreshold(samples[suid_]);
+  ssc::say("%s_THRESHOLD: %.0f\n", namesOf(mode_).printed, static_cast<double>(threshold));
+  return SkipsWrite() ? ssc::kOk : store(threshold);
+}
+
+int ProxCalibrator::collect() {
+  const int result = CollectSamples(std::chrono::seconds(sampleCount_ / kRateHz + kExtraSeconds), true);
+  if (result == ssc::kTimedOut) {
+    ssc::log(ssc::kLogError, "Timed out waiting for proximity sensor samples");
+  }
+  return result == ssc::kOk ? RequireSamples(suid_) : result;
+}
+
+int ProxCalibrator::store(float threshold) {
+  sns_registry_data data;
+  int result = ssc::RegistryUtil(connection).Read(groupName(), &data);
+  if (result == ssc::kOk) result = keepApart(threshold, &data);
+  if (result != ssc::kOk) return result;
+
+  // Looked for only now: a group without this mode's own threshold has the other one moved all the same.
+  const char* const own = namesOf(mode_).item;
+  result = requireItem(own, data);
+  if (result != ssc::kOk) return result;
+  setFloatItem(own, threshold, &data);
+  result = WriteRegistry(groupName(), data);
+  if (result != ssc::kOk) return result;
+
+  ssc::log(ssc::kLogDebug, "Notifying proximity sensor of completed calibration");
+  // Unlike in most commands this failure is the command's, although the threshold is stored: the line has to
+  // reboot the handset before it goes on.
+  result = requestReread();
+  if (result != ssc::kOk) {
+    ssc::log(ssc::kLogWarn, "Notification failed; device may require reboot for calibration to take effect");
+  }
+  return result;
+}
+
+int ProxCalibrator::keepApart(float threshold, sns_registry_data* data) {
+  const char* const other = otherNamesOf(mode_).item;
+  const int result = requireItem(other, *data);
+  if (result != ssc::kOk) return result;
+  const std::optional<float> displaced = displacedThreshold(mode_, threshold, floatItem(other, *data));
+  if (!displaced) return ssc::kOk;
+  ssc::say("Set default threshold with MIN_DIFF\n");
+  setFloatItem(other, *displaced, data);
+  const int written = ssc::RegistryUtil(connection).Write(groupName(), *data);
+  if (written != ssc::kOk) ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", written);
+  return written;
+}
+
+/// The factory test makes the sensor read its calibration again. Its answer is not waited for.
+int ProxCalibrator::requestReread() { return SendRequest(MakeFactoryTestRequest(suid_)); }
+
+int ProxCalibrator::Reset() {
+  int result = LookupSuid();
+  if (result != ssc::kOk) return result;
+  ssc::RegistryUtil registry(connection);
+  sns_registry_data data;
+  result = registry.Read(groupName(), &data);
+  if (result != ssc::kOk) return result;
+  ssc::say("Resetting proximity sensor calibration...\n");
+  for (const ThresholdNames& names : {kNear, kFar}) {
+    result = requireItem(names.item, data);
+    if (result != ssc::kOk) return result;
+  }
+  setFloatItem(kNear.item, kDefaultNearThreshold, &data);
+  setFloatItem(kFar.item, kDefaultFarThreshold, &data);
+  result = registry.Write(groupName(), data);
+  if (result != ssc::kOk) return result;
+  result = requestReread();
+  if (result != ssc::kOk) ssc::say("Reboot device for default calibration to take effect.\n");
+  return result;
+}
