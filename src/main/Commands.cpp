@@ -3,6 +3,7 @@
 #include <string_view>
 
 #include "mag/BaroCalibrator.h"
+#include "mag/MagCalibrator.h"
 
 namespace {
 
@@ -23,6 +24,7 @@ struct Command {
 // is compared as it stands, capitals included.
 constexpr Command kCommands[] = {
     {"baro", anyDevice, make<BaroCalibrator>},
+    {"mag", anyDevice, make<MagCalibrator>},
 };
 
 }  // namespace
