@@ -4,6 +4,9 @@
 
 #include "mag/BaroCalibrator.h"
 #include "mag/MagCalibrator.h"
+#include "mag/MagCurrentSensitivity.h"
+#include "mag/MagOrientation.h"
+#include "mag/MagSoftIron.h"
 
 namespace {
 
@@ -25,6 +28,9 @@ struct Command {
 constexpr Command kCommands[] = {
     {"baro", anyDevice, make<BaroCalibrator>},
     {"mag", anyDevice, make<MagCalibrator>},
+    {"mag-orient", anyDevice, make<MagOrientation>},
+    {"mag-sensitivity", anyDevice, make<MagCurrentSensitivity>},
+    {"mag-softiron", anyDevice, make<MagSoftIron>},
 };
 
 }  // namespace
