@@ -1,5 +1,6 @@
 #include "simhub/Hub.h"
 
+#include <algorithm>
 #include <cmath>
 #include <map>
 
@@ -503,9 +504,15 @@ TEST(Hub, EveryBuiltInScenarioHasItsBarometer) {
     HubHarness hub({}, name);
     EXPECT_THAT(hub.LookUp("pressure"), SizeIs(1)) << name;
     EXPECT_THAT(hub.LookUp("pressure_raw"), SizeIs(name == "e4d4" ? 0 : 1)) << name;
-    EXPECT_THAT(hub.LookUp("sensor_temperature"), SizeIs(1)) << name;
-    const std::string group =
-        simhub::packageName(hub.scenario.sensors.front().name) + "_0_platform.pressure.fac_cal";
+    const auto& sensors = hub.scenario.sensors;
+    const auto barometer = std::find_if(sensors.begin(), sensors.end(),
+                                        [](const auto& each) { return each.dataType == "pressure"; });
+    ASSERT_NE(barometer, sensors.end()) << name;
+    const std::string package = simhub::packageName(barometer->name);
+    EXPECT_TRUE(std::any_of(sensors.begin(), sensors.end(), [&](const auto& each) {
+      return each.dataType == "sensor_temperature" && simhub::packageName(each.name) == package;
+    })) << name;
+    const std::string group = package + "_0_platform.pressure.fac_cal";
     ASSERT_TRUE(hub.ReadRegistry(group)) << name;
     EXPECT_THAT(show(*hub.ReadRegistry(group)), HasSubstr("bias={x=")) << name;
   }
