@@ -1,6 +1,7 @@
 #include "simhub/SensorModels.h"
 
 #include "simhub/sensors/Barometer.h"
+#include "simhub/sensors/Magnetometer.h"
 #include "simhub/sensors/Thermometer.h"
 
 namespace simhub {
@@ -17,6 +18,13 @@ constexpr SensorModel kModels[] = {
      {},
      make<Barometer>,
      "One value, the air pressure in hPa. Calibration: the first number of \"bias\" is subtracted."},
+    {"magnetometer",
+     "_0_platform.mag.fac_cal",
+     {},
+     make<Magnetometer>,
+     "Three values, the magnetic field in µT along the handset's axes. Calibration: \"bias\" is subtracted, "
+     "the "
+     "rest multiplied by \"corr_mat\"."},
     {"temperature", "", {}, make<Thermometer>, "One value, the chip's temperature in °C."},
 };
 
