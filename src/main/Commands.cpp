@@ -4,6 +4,10 @@
 
 #include "light/AlsCalibrator.h"
 #include "mag/BaroCalibrator.h"
+#include "mag/MagCalibrator.h"
+#include "mag/MagCurrentSensitivity.h"
+#include "mag/MagOrientation.h"
+#include "mag/MagSoftIron.h"
 #include "prox/ProxCalibrator.h"
 
 namespace {
@@ -33,6 +37,10 @@ struct Command {
 constexpr Command kCommands[] = {
     {"als", hasClassicAmbientLight, make<AlsCalibrator>},
     {"baro", anyDevice, make<BaroCalibrator>},
+    {"mag", anyDevice, make<MagCalibrator>},
+    {"mag-orient", anyDevice, make<MagOrientation>},
+    {"mag-sensitivity", anyDevice, make<MagCurrentSensitivity>},
+    {"mag-softiron", anyDevice, make<MagSoftIron>},
     {"prox", hasProximityThresholds, make<ProxCalibrator>},
 };
 

@@ -89,6 +89,7 @@ class Hub::Impl {
   void test(const Call& call);
   void handleOwn(const Call& call);
   void loadCalibration(Sensor& sensor);
+  void reloadCalibration(const Sensor& told);
   void start();
   void goDown(Time back);
   void comeUp();
@@ -302,7 +303,7 @@ void Hub::Impl::handleSensor(const Call& call) {
       return;
     case kCalibrationChangedRequest:
       if (!sensor.Config().physical) break;
-      loadCalibration(sensor);
+      reloadCalibration(sensor);
       if (!call.faults.noNotification) answer(call, kCalibrationChangedReply, {});
       return;
     default:
@@ -335,7 +336,7 @@ void Hub::Impl::test(const Call& call) {
     answerError(call, sensor.Config().physical ? SNS_STD_ERROR_INVALID_TYPE : SNS_STD_ERROR_NOT_SUPPORTED);
     return;
   }
-  loadCalibration(sensor);
+  reloadCalibration(sensor);
   if (call.faults.noNotification) return;
   sns_physical_sensor_test_event event;
   event.set_test_passed(true);
@@ -363,6 +364,14 @@ void Hub::Impl::loadCalibration(Sensor& sensor) {
   sns_registry_data items;
   if (store_.Read(group, &items) != RegistryStore::Result::kOk) items.Clear();
   sensor.ApplyCalibration(items);
+}
+
+/// The streams of one chip share its calibration: to tell one of them is to tell all.
+void Hub::Impl::reloadCalibration(const Sensor& told) {
+  const std::string group = told.CalibrationGroup();
+  for (const auto& sensor : sensors_) {
+    if (sensor->CalibrationGroup() == group) loadCalibration(*sensor);
+  }
 }
 
 void Hub::Impl::start() {

@@ -2,6 +2,7 @@
 
 #include "simhub/sensors/AmbientLight.h"
 #include "simhub/sensors/Barometer.h"
+#include "simhub/sensors/Magnetometer.h"
 #include "simhub/sensors/Proximity.h"
 #include "simhub/sensors/Thermometer.h"
 
@@ -38,6 +39,13 @@ constexpr SensorModel kModels[] = {
      "Proximity events of raw counts, 0 to 255, and the reading before it is cut to counts. Calibration: "
      "near from "
      "\"near_threshold\" on, far from \"far_threshold\" down."},
+    {"magnetometer",
+     "_0_platform.mag.fac_cal",
+     {},
+     make<Magnetometer>,
+     "Three values, the magnetic field in µT along the handset's axes. Calibration: \"bias\" is subtracted, "
+     "the "
+     "rest multiplied by \"corr_mat\"."},
     {"temperature", "", {}, make<Thermometer>, "One value, the chip's temperature in °C."},
 };
 

@@ -166,7 +166,8 @@ void readSensor(const toml::table& table, SensorConfig* config, Problems& proble
     (void)reader.Numbers(parameter.key, parameter.minCount, parameter.maxCount, parameter.low, parameter.high,
                          &values);
   }
-  if (config->name.empty()) reader.Problem("", "needs a name");
+  // An absent sensor is often one that a base has and nobody has named.
+  if (config->present && config->name.empty()) reader.Problem("", "needs a name");
   reader.RejectOthers();
 }
 

@@ -71,7 +71,7 @@ int RegistryUtil::lookup() {
   return result;
 }
 
-int RegistryUtil::Read(const std::string& group, sns_registry_data* out) {
+int RegistryUtil::Read(const std::string& group, sns_registry_data* out, Absence absence) {
   const int found = lookup();
   if (found != kOk) return found;
   sns_registry_read_req query;
@@ -91,7 +91,7 @@ int RegistryUtil::Read(const std::string& group, sns_registry_data* out) {
       });
   if (result == kOk) {
     out->Swap(answer.mutable_data());
-  } else {
+  } else if (result != kNotFound || absence == Absence::kReported) {
     log(kLogError, "Unable to read registry group \"%s\". Error = %d", group.c_str(), result);
   }
   return result;

@@ -19,9 +19,12 @@ class RegistryUtil {
   /// The folder of the registry's files on the handset, with the closing slash. A file is named as its group.
   [[nodiscard]] static std::string RegistryPath();
 
-  /// Fills `out` with the group's items, its subgroups filled in. 0; kNotFound when there is no such group
-  /// (with a level-0 message); kTimedOut; kMalformed; or what sending returned.
-  int Read(const std::string& group, sns_registry_data* out);
+  /// Whether a group that does not exist is worth a level-0 message.
+  enum class Absence { kReported, kExpected };
+
+  /// Fills `out` with the group's items, its subgroups filled in. 0; kNotFound when there is no such group;
+  /// kTimedOut; kMalformed; or what sending returned. A failure is a level-0 message.
+  int Read(const std::string& group, sns_registry_data* out, Absence absence = Absence::kReported);
 
   /// Writes the items; the hub keeps those that are not named. With `group2` and `data2` a second group is
   /// written after the first. 0; kIoError when the hub could not write; kTimedOut; kMalformed; or what
