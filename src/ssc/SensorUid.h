@@ -24,6 +24,7 @@ struct SensorUid {
   /// No sensor has the SUID zero.
   [[nodiscard]] bool IsZero() const { return high == 0 && low == 0; }
 
+  // NOLINTNEXTLINE(modernize-use-nullptr): the check takes the zero of the generated comparison for a pointer
   friend auto operator<=>(const SensorUid&, const SensorUid&) = default;
 };
 
