@@ -61,8 +61,7 @@ TEST(Fault, TableIsInTheOrderOfItsKinds) {
   }
 }
 
-// ---- Readings
-// ------------------------------------------------------------------------------------------------
+// ---- Readings ----
 
 TEST(HubFaults, SilentSensorTakesRequestsAndSendsNothing) {
   Streaming run({"kind=silent", "sensor=pressure"});
@@ -159,8 +158,7 @@ TEST(HubFaults, ReorderedEvents) {
   for (std::size_t i = 2; i < events.size(); i += 2) EXPECT_GT(events[i + 1].ticks, events[i - 2].ticks);
 }
 
-// ---- Requests
-// ------------------------------------------------------------------------------------------------
+// ---- Requests ----
 
 TEST(HubFaults, AbsentSensorIsNotListedAndUnknown) {
   HubHarness hub(fault({"kind=absent", "sensor=pressure"}));
@@ -228,8 +226,7 @@ TEST(HubFaults, NoNotificationReplyButTheCalibrationIsReloaded) {
   EXPECT_FLOAT_EQ(hub.Readings(suid).back().data(0), 1013.25F);
 }
 
-// ---- The registry
-// --------------------------------------------------------------------------------------------
+// ---- The registry ----
 
 TEST(HubFaults, GroupMissing) {
   HubHarness hub(fault({"kind=group_missing", std::string("group=") + kGroup}));
@@ -293,8 +290,7 @@ TEST(HubFaults, FullDiskEndsWithItsWindow) {
   EXPECT_EQ(hub.WriteRegistry(kGroup, bias(1)), SNS_REGISTRY_WRITE_STATUS_SUCCESS);
 }
 
-// ---- The hub
-// -------------------------------------------------------------------------------------------------
+// ---- The hub ----
 
 TEST(HubFaults, HubGoesAwayAfterSomeReadingsAndComesBack) {
   HubHarness hub(fault({"kind=hub_away", "after=5", "down_for=2"}));
