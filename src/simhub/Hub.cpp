@@ -3,11 +3,11 @@
 #include <algorithm>
 #include <cmath>
 #include <cstring>
-#include <map>
 #include <utility>
 
 #include "proto/sns_client.pb.h"
 #include "proto/sns_suid.pb.h"
+#include "simhub/Directory.h"
 #include "simhub/EventQueue.h"
 #include "simhub/FaultPlan.h"
 #include "simhub/Outbox.h"
@@ -23,15 +23,6 @@ namespace {
 constexpr const char* kRegistryFolder = "/mnt/vendor/persist/sensors/registry/registry";
 
 Time later(Time time, Time by) { return time + std::min(by, kNever - std::min(time, kNever)); }
-
-/// The look-up and registry sensors, which have no section of their own, as others see them.
-SensorConfig serviceConfig(const char* dataType) {
-  SensorConfig config;
-  config.key = config.dataType = config.name = dataType;
-  config.streamType = SNS_STD_SENSOR_STREAM_TYPE_ON_CHANGE;
-  config.physical = false;
-  return config;
-}
 
 }  // namespace
 
@@ -63,17 +54,13 @@ class Hub::Impl {
   /// A request on its way through the hub.
   struct Call {
     ClientId client;
-    std::uint32_t addressee;  ///< index as in addressees()
+    std::uint32_t addressee;  ///< as in the directory
     std::uint32_t messageId;
     const sns_std_request& request;
     Suid suid;
     RequestFaults faults;
   };
 
-  [[nodiscard]] static std::vector<Addressee> addressees(const std::vector<SensorConfig>& sensors);
-  [[nodiscard]] bool isSensor(std::uint32_t addressee) const { return addressee < sensors_.size(); }
-  [[nodiscard]] AddresseeKind kindOf(std::uint32_t addressee) const;
-  [[nodiscard]] const SensorConfig& configOf(std::uint32_t addressee) const;
   [[nodiscard]] Time answerTime() const {
     return later(later(now_, scenario_.hub.responseLatency), scenario_.hub.answerLatency);
   }
@@ -101,18 +88,14 @@ class Hub::Impl {
   bool isUp_ = true;
   ClientId lastClient_ = 0;
   RequestLog log_;
+  const Directory directory_;
   EventQueue queue_;
   Outbox outbox_;
   FaultPlan faults_;
   RegistryFiles files_;
   RegistryStore store_;
   RegistrySensor registry_;
-  std::vector<std::unique_ptr<Sensor>> sensors_;
-  std::map<Suid, std::uint32_t> bySuid_;
-  const SensorConfig registryConfig_ = serviceConfig(kRegistryDataType);
-  const SensorConfig lookupConfig_ = serviceConfig(kSuidDataType);
-  const Suid registrySuid_ = suidForName(kRegistryDataType);
-  std::vector<FaultPlan::Departure> departures_;
+  const std::vector<FaultPlan::Departure> departures_;
   Streams streams_;
   sns_client_request_msg message_;  // the request at hand, reused
 };
@@ -121,48 +104,21 @@ Hub::Impl::Impl(Scenario scenario, const std::string& folder, HubOutput& output,
                 const SensorMaker& makeSensor)
     : scenario_(std::move(scenario)),
       output_(output),
+      directory_(scenario_, makeSensor),
       outbox_(output, queue_, statistics_, scenario_.hub.startTicks),
-      faults_(scenario_.faults, addressees(scenario_.sensors)),
+      faults_(scenario_.faults, directory_.Names()),
       files_(folder),
       store_(files_, scenario_.registry, [&output](const std::string& text) { output.Diagnostic(text); }),
       registry_(store_, files_, faults_),
       departures_(faults_.Departures()),
-      streams_(sensors_, scenario_.hub, queue_, outbox_, faults_, statistics_) {
-  const SensorSurroundings surroundings{scenario_.world, scenario_.hub.seed};
-  for (const SensorConfig& config : scenario_.sensors) {
-    const auto index = static_cast<std::uint32_t>(sensors_.size());
-    sensors_.push_back(makeSensor(config, surroundings));
-    bySuid_[sensors_.back()->Suid()] = index;
-  }
-  bySuid_[registrySuid_] = static_cast<std::uint32_t>(sensors_.size());
-  bySuid_[kLookupSuid] = static_cast<std::uint32_t>(sensors_.size() + 1);
-  streams_.SetSensorCount(sensors_.size());
+      streams_(directory_.Sensors(), scenario_.hub, queue_, outbox_, faults_, statistics_) {
   for (std::uint32_t i = 0; i < departures_.size(); ++i) {
     queue_.Push(departures_[i].at, HubEvent::Kind::kDown, i);
   }
   start();
 }
 
-std::vector<Addressee> Hub::Impl::addressees(const std::vector<SensorConfig>& sensors) {
-  std::vector<Addressee> all;
-  for (const SensorConfig& config : sensors) all.push_back({config.key, config.dataType});
-  all.push_back({kRegistryDataType, kRegistryDataType});
-  all.push_back({kSuidDataType, kSuidDataType});
-  return all;
-}
-
-AddresseeKind Hub::Impl::kindOf(std::uint32_t addressee) const {
-  if (isSensor(addressee)) return AddresseeKind::kSensor;
-  return addressee == sensors_.size() ? AddresseeKind::kRegistry : AddresseeKind::kLookup;
-}
-
-const SensorConfig& Hub::Impl::configOf(std::uint32_t addressee) const {
-  if (isSensor(addressee)) return sensors_[addressee]->Config();
-  return kindOf(addressee) == AddresseeKind::kRegistry ? registryConfig_ : lookupConfig_;
-}
-
-// ---- Requests
-// ------------------------------------------------------------------------------------------------
+// ---- Requests ----
 
 void Hub::Impl::malformed(ClientId client, const char* what) {
   ++statistics_.malformedDatagrams;
@@ -184,20 +140,20 @@ bool Hub::Impl::HandleDatagram(ClientId client, qmi::Bytes datagram) {
   }
   ++statistics_.requests;
   const Suid suid = suidOf(message_.suid());
-  const auto entry = bySuid_.find(suid);
-  const bool isKnown = entry != bySuid_.end() && !faults_.IsAbsent(entry->second, now_);
-  log_.Write(now_, isKnown ? configOf(entry->second).key : "unknown",
-             isKnown ? kindOf(entry->second) : AddresseeKind::kUnknown, message_);
+  const std::uint32_t addressee = directory_.Find(suid).value_or(directory_.Count());
+  const bool isKnown = addressee < directory_.Count() && !faults_.IsAbsent(addressee, now_);
+  log_.Write(now_, isKnown ? directory_.ConfigOf(addressee).key : "unknown",
+             isKnown ? directory_.KindOf(addressee) : AddresseeKind::kUnknown, message_);
   if (!isKnown) {
     outbox_.Respond(client, request->transactionId, kQmiFailure, kQmiInvalidId, responseTime);
     return true;
   }
   const Call call{client,
-                  entry->second,
+                  addressee,
                   message_.msg_id(),
                   message_.request(),
                   suid,
-                  faults_.OnRequest(entry->second, message_.msg_id(), now_)};
+                  faults_.OnRequest(addressee, message_.msg_id(), now_)};
   if (call.faults.qmiError) {
     outbox_.Respond(client, request->transactionId, kQmiFailure,
                     static_cast<std::uint16_t>(*call.faults.qmiError), responseTime);
@@ -218,7 +174,7 @@ bool Hub::Impl::HandleDatagram(ClientId client, qmi::Bytes datagram) {
 void Hub::Impl::answer(const Call& call, std::uint32_t messageId, const std::string& payload, Time delay) {
   const Time time = later(answerTime(), delay);
   if (!outbox_.Answer(call.client, call.suid, messageId, payload, time)) {
-    output_.Diagnostic(configOf(call.addressee).key + ": an answer is too large to send");
+    output_.Diagnostic(directory_.ConfigOf(call.addressee).key + ": an answer is too large to send");
     answerError(call, SNS_STD_ERROR_FAILED);
   }
 }
@@ -235,7 +191,7 @@ void Hub::Impl::carryOut(const Call& call) {
     answerAttributes(call);
     return;
   }
-  switch (kindOf(call.addressee)) {
+  switch (directory_.KindOf(call.addressee)) {
     case AddresseeKind::kSensor:
       handleSensor(call);
       return;
@@ -262,7 +218,7 @@ void Hub::Impl::answerAttributes(const Call& call) {
     return;
   }
   sns_std_attr_event event;
-  describeSensor(configOf(call.addressee), &event);
+  describeSensor(directory_.ConfigOf(call.addressee), &event);
   answer(call, kAttributesEvent, event.SerializeAsString());
 }
 
@@ -275,19 +231,17 @@ void Hub::Impl::lookUp(const Call& call) {
   }
   sns_suid_event event;
   event.set_data_type(request.data_type());
-  const auto list = [&](std::uint32_t addressee, const Suid& suid) {
-    const bool isWanted = request.data_type().empty() || request.data_type() == configOf(addressee).dataType;
+  for (std::uint32_t i = 0; i < directory_.Count(); ++i) {
+    const bool isWanted =
+        request.data_type().empty() || request.data_type() == directory_.ConfigOf(i).dataType;
     const bool isEnough = request.default_only() && event.suid_size() > 0;
-    if (isWanted && !isEnough && !faults_.IsAbsent(addressee, now_)) suid.CopyTo(event.add_suid());
-  };
-  for (std::uint32_t i = 0; i < sensors_.size(); ++i) list(i, sensors_[i]->Suid());
-  list(bySuid_.at(registrySuid_), registrySuid_);
-  list(bySuid_.at(kLookupSuid), kLookupSuid);
+    if (isWanted && !isEnough && !faults_.IsAbsent(i, now_)) directory_.SuidOf(i).CopyTo(event.add_suid());
+  }
   answer(call, kSuidEvent, event.SerializeAsString());
 }
 
 void Hub::Impl::handleSensor(const Call& call) {
-  Sensor& sensor = *sensors_[call.addressee];
+  Sensor& sensor = *directory_.Sensors()[call.addressee];
   switch (call.messageId) {
     case kDisableRequest:
       streams_.Stop(call.client, call.addressee, now_);
@@ -330,7 +284,7 @@ void Hub::Impl::startStream(const Call& call) {
 }
 
 void Hub::Impl::test(const Call& call) {
-  Sensor& sensor = *sensors_[call.addressee];
+  Sensor& sensor = *directory_.Sensors()[call.addressee];
   sns_physical_sensor_test_config config;
   if (!sensor.Config().physical || !config.ParseFromString(call.request.payload())) {
     answerError(call, sensor.Config().physical ? SNS_STD_ERROR_INVALID_TYPE : SNS_STD_ERROR_NOT_SUPPORTED);
@@ -347,7 +301,7 @@ void Hub::Impl::test(const Call& call) {
 void Hub::Impl::handleOwn(const Call& call) {
   std::vector<SensorAnswer> answers;
   const SensorRequest request{now_, call.messageId, call.request.payload(), call.faults.oemFailure};
-  if (!sensors_[call.addressee]->HandleRequest(request, &answers)) {
+  if (!directory_.Sensors()[call.addressee]->HandleRequest(request, &answers)) {
     answerError(call, SNS_STD_ERROR_NOT_SUPPORTED);
     return;
   }
@@ -355,8 +309,7 @@ void Hub::Impl::handleOwn(const Call& call) {
   for (const SensorAnswer& reply : answers) answer(call, reply.messageId, reply.payload, reply.delay);
 }
 
-// ---- Life
-// ----------------------------------------------------------------------------------------------------
+// ---- Life ----
 
 void Hub::Impl::loadCalibration(Sensor& sensor) {
   const std::string group = sensor.CalibrationGroup();
@@ -376,7 +329,7 @@ void Hub::Impl::reloadCalibration(const Sensor& told) {
 
 void Hub::Impl::start() {
   store_.Load(faults_.TornGroups());
-  for (const auto& sensor : sensors_) {
+  for (const auto& sensor : directory_.Sensors()) {
     sensor->Restart();
     loadCalibration(*sensor);
   }
@@ -424,8 +377,7 @@ void Hub::Impl::Step() {
   }
 }
 
-// ---- The outside
-// ---------------------------------------------------------------------------------------------
+// ---- The outside ----
 
 std::unique_ptr<Hub> Hub::Create(Scenario scenario, const std::string& registryFolder, HubOutput& output,
                                  std::string* error, const SensorMaker& makeSensor) {

@@ -61,8 +61,7 @@ std::unique_ptr<SocketServer> SocketServer::Create(const SocketServerOptions& op
 
 SocketServer::~SocketServer() { stopListening(); }
 
-// ---- The socket
-// ----------------------------------------------------------------------------------------------
+// ---- The socket ----
 
 bool SocketServer::listen(std::string* error) {
   sockaddr_un address{};
@@ -187,8 +186,7 @@ void SocketServer::dropLost() {
   }
 }
 
-// ---- The hub
-// -------------------------------------------------------------------------------------------------
+// ---- The hub ----
 
 void SocketServer::HubDown() {
   // As when a hub's process ends: nobody is connected, and nobody can be.

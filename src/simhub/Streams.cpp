@@ -29,7 +29,8 @@ Streams::Streams(const std::vector<std::unique_ptr<Sensor>>& sensors, const HubC
       queue_(queue),
       outbox_(outbox),
       faults_(faults),
-      statistics_(statistics) {}
+      statistics_(statistics),
+      running_(sensors.size()) {}
 
 void Streams::Start(ClientId client, std::uint32_t sensor, const StreamRequest& request, Time now) {
   const SensorConfig& config = sensors_[sensor]->Config();

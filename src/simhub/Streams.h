@@ -23,11 +23,9 @@ struct StreamRequest {
 
 class Streams {
  public:
-  /// All references outlive the streams. Sensors keep their index from SetSensorCount on.
+  /// All references outlive the streams, and the sensors keep their index.
   Streams(const std::vector<std::unique_ptr<Sensor>>& sensors, const HubConfig& config, EventQueue& queue,
           Outbox& outbox, FaultPlan& faults, HubStatistics& statistics);
-
-  void SetSensorCount(std::size_t count) { running_.resize(count); }
 
   /// Starts the client's stream of the sensor, or replaces it.
   void Start(ClientId client, std::uint32_t sensor, const StreamRequest& request, Time now);

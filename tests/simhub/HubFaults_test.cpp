@@ -59,8 +59,7 @@ TEST(Fault, TableIsInTheOrderOfItsKinds) {
   }
 }
 
-// ---- Readings
-// ------------------------------------------------------------------------------------------------
+// ---- Readings ----
 
 TEST(HubFaults, SilentSensorTakesRequestsAndSendsNothing) {
   Streaming run({"kind=silent", "sensor=pressure"});
@@ -157,8 +156,7 @@ TEST(HubFaults, ReorderedEvents) {
   for (std::size_t i = 2; i < events.size(); i += 2) EXPECT_GT(events[i + 1].ticks, events[i - 2].ticks);
 }
 
-// ---- Requests
-// ------------------------------------------------------------------------------------------------
+// ---- Requests ----
 
 TEST(HubFaults, AbsentSensorIsNotListedAndUnknown) {
   HubHarness hub(fault({"kind=absent", "sensor=pressure"}));
@@ -226,8 +224,7 @@ TEST(HubFaults, NoNotificationReplyButTheCalibrationIsReloaded) {
   EXPECT_FLOAT_EQ(hub.Readings(suid).back().data(0), 1013.25F);
 }
 
-// ---- The registry
-// --------------------------------------------------------------------------------------------
+// ---- The registry ----
 
 TEST(HubFaults, GroupMissing) {
   HubHarness hub(fault({"kind=group_missing", std::string("group=") + kGroup}));
@@ -291,8 +288,7 @@ TEST(HubFaults, FullDiskEndsWithItsWindow) {
   EXPECT_EQ(hub.WriteRegistry(kGroup, bias(1)), SNS_REGISTRY_WRITE_STATUS_SUCCESS);
 }
 
-// ---- The hub
-// -------------------------------------------------------------------------------------------------
+// ---- The hub ----
 
 TEST(HubFaults, HubGoesAwayAfterSomeReadingsAndComesBack) {
   HubHarness hub(fault({"kind=hub_away", "after=5", "down_for=2"}));

@@ -42,8 +42,7 @@ sns_registry_data biasItems(float bias) {
   return items;
 }
 
-// ---- Look-up and attributes
-// ----------------------------------------------------------------------------------
+// ---- Look-up and attributes ----
 
 TEST(Hub, ListsTheSensorsOfADataType) {
   HubHarness hub;
@@ -102,8 +101,7 @@ TEST(Hub, AttributesAreAnsweredWithTheUpdateFlagToo) {
   EXPECT_TRUE(event && event->messageId == simhub::kAttributesEvent);
 }
 
-// ---- Requests that make no sense
-// -----------------------------------------------------------------------------
+// ---- Requests that make no sense ----
 
 TEST(Hub, RespondsBeforeItAnswers) {
   HubHarness hub({"hub.response_latency_ms=0.2", "hub.answer_latency_ms=0.3"});
@@ -185,8 +183,7 @@ TEST(Hub, RatesThatMakeNoSenseAreRefused) {
   EXPECT_THAT(hub.Readings(suid), IsEmpty());
 }
 
-// ---- Streams
-// -------------------------------------------------------------------------------------------------
+// ---- Streams ----
 
 TEST(Hub, StreamsAtTheAskedRate) {
   HubHarness hub({"hub.start_ticks=1000", "sensor.pressure.latency_ms=2"});
@@ -357,8 +354,7 @@ TEST(Hub, SingleOutputSensorSendsOneReading) {
   EXPECT_EQ(hub.hub->NextEventTime(), std::nullopt);
 }
 
-// ---- Readings and calibration
-// --------------------------------------------------------------------------------
+// ---- Readings and calibration ----
 
 TEST(Hub, ReadsTheWorldThroughTheErrorModel) {
   HubHarness hub({"world.pressure=1000", "sensor.pressure.bias=3", "sensor.pressure.noise=0.02"});
@@ -425,8 +421,7 @@ TEST(Hub, RestartAppliesWhatTheRegistryHolds) {
   EXPECT_FLOAT_EQ(hub.Readings(simhub::suidForName("pressure")).back().data(0), 1013.25F);
 }
 
-// ---- The registry over the wire
-// ------------------------------------------------------------------------------
+// ---- The registry over the wire ----
 
 TEST(Hub, ReadsAndMergesRegistryGroups) {
   HubHarness hub;
@@ -468,8 +463,7 @@ TEST(Hub, GroupTooLargeForAReportIsAnErrorEvent) {
   EXPECT_EQ(hub.ReadRegistry("big"), std::nullopt);
 }
 
-// ---- Determinism
-// ---------------------------------------------------------------------------------------------
+// ---- Determinism ----
 
 std::vector<std::vector<std::uint8_t>> run(const std::vector<std::string>& overrides) {
   HubHarness hub(overrides);

@@ -179,8 +179,7 @@ TEST(Scenario, CircleOfExtendsIsReported) {
   EXPECT_THAT(error, HasSubstr("extend each other"));
 }
 
-// ---- What is wrong, where
-// ------------------------------------------------------------------------------------
+// ---- What is wrong, where ----
 
 TEST(ScenarioModel, MissingOrUnknownIsReportedWithTheKnownOnes) {
   std::string known;
@@ -284,8 +283,7 @@ TEST(Scenario, SeveralMistakesAreReportedAtOnce) {
             "test.toml:3: hub.b: unknown key");
 }
 
-// ---- Overrides
-// -----------------------------------------------------------------------------------------------
+// ---- Overrides ----
 
 TEST(Scenario, OverridesReplaceNumbersTextAndLists) {
   const Scenario scenario = parse(kBarometer, {"sensor.pressure.noise=0.3", "sensor.pressure.name=some chip",
@@ -327,8 +325,7 @@ TEST(Scenario, MistakesInOverridesNameTheOverride) {
   EXPECT_THAT(errorOf("", {"hub=3"}), HasSubstr("hub: has to be a table"));
 }
 
-// ---- Sensors' names
-// ------------------------------------------------------------------------------------------
+// ---- Sensors' names ----
 
 TEST(PackageName, IsCutAtTheFirstBlankElseAtTheFirstUnderscore) {
   EXPECT_EQ(simhub::packageName("chipa_0"), "chipa");
