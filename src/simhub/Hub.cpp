@@ -322,7 +322,7 @@ void Hub::Impl::loadCalibration(Sensor& sensor) {
 /// The streams of one chip share its calibration: to tell one of them is to tell all.
 void Hub::Impl::reloadCalibration(const Sensor& told) {
   const std::string group = told.CalibrationGroup();
-  for (const auto& sensor : sensors_) {
+  for (const auto& sensor : directory_.Sensors()) {
     if (sensor->CalibrationGroup() == group) loadCalibration(*sensor);
   }
 }
