@@ -82,6 +82,7 @@ void readMoves(const WorldSignalRow& row, const toml::array& list, const std::st
 void readWorld(const toml::table& table, World* world, Problems& problems) {
   TableReader reader(table, "world", problems);
   for (const WorldSignalRow& row : worldSignals()) readWorldSignal(row, reader, world, problems);
+  readRotation(reader, world, problems);
   reader.RejectOthers();
 }
 

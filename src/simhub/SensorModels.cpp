@@ -2,6 +2,7 @@
 
 #include "simhub/sensors/AmbientLight.h"
 #include "simhub/sensors/Barometer.h"
+#include "simhub/sensors/ImuSensors.h"
 #include "simhub/sensors/Magnetometer.h"
 #include "simhub/sensors/Proximity.h"
 #include "simhub/sensors/Thermometer.h"
@@ -27,6 +28,15 @@ constexpr SensorParameter kProximityParameters[] = {
     {"reference_counts", 1, 1, 0, 65535, 140, "this much light, in counts."},
 };
 
+constexpr SensorParameter kImuParameters[] = {
+    {"with_raw", 1, 1, 0, 1, 0,
+     "1: a reading has six values, the calibrated ones and then the uncalibrated."},
+    {"bias_first", 1, 1, 0, 1, 0, "1: the bias is subtracted before the matrix is applied; 0: after."},
+    {"outliers", 1, 1, 0, 1e9, 0, "How many readings are outliers, from the first on that can be one."},
+    {"outlier_every", 1, 1, 1, 1e9, 50, "One of so many readings can be an outlier."},
+    {"outlier_size", 1, 1, -1e6, 1e6, 5, "What an outlier's first value has too much, in the sensor's unit."},
+};
+
 constexpr SensorModel kModels[] = {
     {"ambient_light", "_0_platform.als.fac_cal", kAmbientLightParameters, make<AmbientLight>,
      "One value, the illuminance in lux. Calibration: multiplied by \"scale\" / 1000."},
@@ -46,6 +56,11 @@ constexpr SensorModel kModels[] = {
      "Three values, the magnetic field in µT along the handset's axes. Calibration: \"bias\" is subtracted, "
      "the "
      "rest multiplied by \"corr_mat\"."},
+    {"accelerometer", "_0_platform.accel.fac_cal", kImuParameters, make<Accelerometer>,
+     "Three values, m/s² by axis: gravity in the handset's pose and other acceleration. Calibration: "
+     "\"corr_mat\" and \"bias\"."},
+    {"gyroscope", "_0_platform.gyro.fac_cal", kImuParameters, make<Gyroscope>,
+     "Three values, rad/s by axis. Calibration: \"corr_mat\" and \"bias\"."},
     {"temperature", "", {}, make<Thermometer>, "One value, the chip's temperature in °C."},
 };
 

@@ -101,6 +101,7 @@ constexpr WorldSignalRow kRows[] = {
      65536,
      {0, 0},
      "What the top and bottom SAR electrodes see of a hand."},
+    {WorldSignal::kGravity, "gravity", 1, "m/s²", 0, 100, {9.80665}, "Local gravity."},
 };
 static_assert(std::size(kRows) == kWorldSignalCount);
 

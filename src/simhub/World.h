@@ -30,6 +30,7 @@ enum class WorldSignal : std::size_t {
   kDisplayColor,
   kDisplayRefreshRate,
   kCapacitance,
+  kGravity,
   kCount
 };
 
