@@ -17,6 +17,16 @@ const sns_registry_data_item* findOrReport(const char* name, const sns_registry_
   return item;
 }
 
+int readMatrixNumbers(const char* name, const sns_registry_data& data, bool diagonal,
+                      std::vector<float>* values) {
+  const sns_registry_data_item* item = findOrReport(name, data, nullptr);
+  if (item == nullptr) return ssc::kInvalid;
+  *values = ssc::RegistryUtil::GetRegistryMatrix(item->subgrp(), diagonal);
+  if (!values->empty()) return ssc::kOk;
+  ssc::log(ssc::kLogError, "Invalid registry; \"%s\" does not hold a 3x3 matrix", name);
+  return ssc::kInvalid;
+}
+
 /// Makes the item hold a subgroup, and returns that.
 sns_registry_data* subgroupForWriting(const char* name, sns_registry_data* data) {
   return ssc::RegistryUtil::GetIncrementedDataItem(name, data)->mutable_subgrp();
@@ -53,12 +63,11 @@ int readVectorItem(const char* name, std::size_t count, const sns_registry_data&
 }
 
 int readMatrixItem(const char* name, const sns_registry_data& data, std::vector<float>* values) {
-  const sns_registry_data_item* item = findOrReport(name, data, nullptr);
-  if (item == nullptr) return ssc::kInvalid;
-  *values = ssc::RegistryUtil::GetRegistryMatrix(item->subgrp(), false);
-  if (!values->empty()) return ssc::kOk;
-  ssc::log(ssc::kLogError, "Invalid registry; \"%s\" does not hold a 3x3 matrix", name);
-  return ssc::kInvalid;
+  return readMatrixNumbers(name, data, false, values);
+}
+
+int readDiagonalItem(const char* name, const sns_registry_data& data, std::vector<float>* values) {
+  return readMatrixNumbers(name, data, true, values);
 }
 
 // Setting one kind of data clears another kind: the item's data is a oneof.

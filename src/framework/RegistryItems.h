@@ -26,6 +26,9 @@
                                  std::vector<float>* values);
 /// The nine numbers of a matrix item in row order; results as above.
 [[nodiscard]] int readMatrixItem(const char* name, const sns_registry_data& data, std::vector<float>* values);
+/// The three numbers on a matrix item's diagonal; results as above.
+[[nodiscard]] int readDiagonalItem(const char* name, const sns_registry_data& data,
+                                   std::vector<float>* values);
 
 // Writing: the item gets its version raised by one (or 1), is made when it is missing, and is cleared when it
 // holds another kind of data. The number items of a vector or matrix get their versions raised too.
