@@ -93,6 +93,18 @@ TEST(MatrixItem, WithSevenEntriesIsInvalid) {
   EXPECT_EQ(captured.err, "ERROR: Invalid registry; \"corr_mat\" does not hold a 3x3 matrix\n");
 }
 
+TEST(MatrixItem, GivesItsDiagonal) {
+  sns_registry_data data;
+  setMatrixItem("corr_mat", {1, 2, 3, 4, 5, 6, 7, 8, 9}, &data);
+  std::vector<float> values;
+  EXPECT_EQ(readDiagonalItem("corr_mat", data, &values), 0);
+  EXPECT_EQ(values, std::vector<float>({1, 5, 9}));
+  data.mutable_items(0)->mutable_subgrp()->mutable_items()->DeleteSubrange(4, 1);
+  const Captured captured = capture([&] { return readDiagonalItem("corr_mat", data, &values); });
+  EXPECT_EQ(captured.result, kInvalid);
+  EXPECT_EQ(captured.err, "ERROR: Invalid registry; \"corr_mat\" does not hold a 3x3 matrix\n");
+}
+
 TEST(WritingAnItem, RaisesItsVersion) {
   sns_registry_data data;
   addFloatItem(&data, "scale", 1, 6);
