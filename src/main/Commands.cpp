@@ -2,6 +2,7 @@
 
 #include <string_view>
 
+#include "imu/ImuMultipointCalibrator.h"
 #include "light/AlsCalibrator.h"
 #include "mag/BaroCalibrator.h"
 #include "mag/MagCalibrator.h"
@@ -37,6 +38,7 @@ struct Command {
 constexpr Command kCommands[] = {
     {"als", hasClassicAmbientLight, make<AlsCalibrator>},
     {"baro", anyDevice, make<BaroCalibrator>},
+    {"imu-multipoint", anyDevice, make<ImuMultipointCalibrator>},
     {"mag", anyDevice, make<MagCalibrator>},
     {"mag-orient", anyDevice, make<MagOrientation>},
     {"mag-sensitivity", anyDevice, make<MagCurrentSensitivity>},
