@@ -273,6 +273,14 @@ TEST(Scenario, TextThatIsNoTomlNamesTheLine) {
   EXPECT_THAT(errorOf("a = " + std::string(100'000, '[')), HasSubstr("test.toml:1: "));
 }
 
+TEST(Scenario, LettersWhereNoneBelongAreAMistake) {
+  // One of each group of characters among which blanks are looked for.
+  for (const char* const letter : {"\u00c9", "\u0409", "\u1681", "\u2020", "\u2061", "\u3001", "\ufefe"}) {
+    EXPECT_THAT(errorOf(std::string("[hub]\nseed = 3") + letter + "\n"), HasSubstr("test.toml:2: "));
+    EXPECT_THAT(errorOf(std::string("[hub]\n") + letter + "seed = 3\n"), HasSubstr("test.toml:2: "));
+  }
+}
+
 TEST(Scenario, CircleOfLikesIsReported) {
   EXPECT_THAT(errorOf("[sensor.a]\nlike = \"b\"\n[sensor.b]\nlike = \"a\"\n"), HasSubstr("in a circle"));
 }
