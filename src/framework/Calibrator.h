@@ -115,6 +115,9 @@ class Calibrator : public ssc::Client {
   }
   /// Whether a collection that runs for a time has come to its end.
   [[nodiscard]] static bool IsCollected(int result) { return result == ssc::kOk || result == ssc::kTimedOut; }
+  /// 0 when IsCollected(result), else `result`, after a level-0 message where the collection itself logged
+  /// none.
+  [[nodiscard]] static int RequireCollected(int result);
   /// Prints every sensor's samples and rate; nothing with --quiet.
   void PrintSamples();
   /// 0 when the sensor has samples, else ssc::kNoData after a level-0 message that names it.

@@ -95,6 +95,13 @@ void Calibrator::PrintSamples() {
   }
 }
 
+int Calibrator::RequireCollected(int result) {
+  if (IsCollected(result)) return ssc::kOk;
+  // An event that does not parse was reported when it came.
+  if (result != ssc::kMalformed) ssc::log(ssc::kLogError, "Unable to collect samples. Error = %d", result);
+  return result;
+}
+
 int Calibrator::RequireSamples(const ssc::SensorUid& suid) {
   const auto found = samples.find(suid);
   if (found != samples.end() && !found->second.empty()) return ssc::kOk;

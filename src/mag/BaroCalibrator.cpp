@@ -130,8 +130,8 @@ int BaroCalibrator::measureAndStore() {
   if (result != ssc::kOk) return result;
   const float previousBias = previous[0];
 
-  result = CollectSamples(std::chrono::seconds(seconds_), true);
-  if (!IsCollected(result)) return result;
+  result = RequireCollected(CollectSamples(std::chrono::seconds(seconds_), true));
+  if (result != ssc::kOk) return result;
   for (const ssc::SensorUid& suid : {pressureSuid_, temperatureSuid_}) {
     result = RequireSamples(suid);
     if (result != ssc::kOk) return result;
@@ -197,6 +197,10 @@ int BaroCalibrator::Reset() {
   setVectorItem(kBias, {0.0F}, &data);
   setFloatItem(kMeanTemp, 0.0F, &data);
   result = registry.Write(groupName(), data);
-  if (result == ssc::kOk) ssc::say("Reboot device for default calibration to take effect.\n");
+  if (result == ssc::kOk) {
+    ssc::say("Reboot device for default calibration to take effect.\n");
+  } else {
+    ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", result);
+  }
   return result;
 }

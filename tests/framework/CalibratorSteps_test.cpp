@@ -95,6 +95,21 @@ TEST_F(CalibratorSteps, ACollectionIsCompleteAfterSuccessOrItsPeriod) {
   EXPECT_FALSE(PlainCalibrator::IsCollected(-2147483647));
 }
 
+TEST_F(CalibratorSteps, ACollectionThatEndsEarlySaysWhy) {
+  for (const int complete : {0, -110}) {
+    const Captured captured = capture([&] { return PlainCalibrator::RequireCollected(complete); });
+    EXPECT_EQ(captured.result, 0);
+    EXPECT_EQ(captured.err, "");
+  }
+  const Captured lost = capture([&] { return PlainCalibrator::RequireCollected(-11); });
+  EXPECT_EQ(lost.result, -11);
+  EXPECT_EQ(lost.err, "ERROR: Unable to collect samples. Error = -11\n");
+  // The malformed event was reported by the handler that got it.
+  const Captured malformed = capture([&] { return PlainCalibrator::RequireCollected(-2147483647); });
+  EXPECT_EQ(malformed.result, -2147483647);
+  EXPECT_EQ(malformed.err, "");
+}
+
 TEST_F(CalibratorSteps, ASensorWithoutSamplesIsNamed) {
   calibrator->SetSensorInfo(a, "Barometer Raw", 20);
   const Captured captured = capture([&] { return calibrator->RequireSamples(a); });

@@ -40,6 +40,7 @@ class PlainCalibrator : public Calibrator {
   using Calibrator::PrintSamples;
   using Calibrator::PrintUsage;
   using Calibrator::quiet;
+  using Calibrator::RequireCollected;
   using Calibrator::RequireFinite;
   using Calibrator::RequireSamples;
   using Calibrator::samples;

@@ -357,7 +357,9 @@ TEST_F(BaroTest, AFailedResetIsTheWritesResult) {
   script->registryWritesFail = true;
   const Captured captured = run({"baro"});
   EXPECT_EQ(captured.result, -5);
-  EXPECT_EQ(captured.out, "Searching for barometer...\nResetting barometer calibration...\n");
+  EXPECT_EQ(captured.out,
+            "Searching for barometer...\nResetting barometer calibration...\n"
+            "WARN: Failed to write registry. Error = -5\n");
 }
 
 struct BadWords {
