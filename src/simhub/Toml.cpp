@@ -10,8 +10,6 @@ namespace {
 
 constexpr std::size_t kMaxProblems = 20;
 constexpr const char* kOverride = "override ";
-constexpr const char* kForeignLetters =
-    "letters that are not ASCII belong into comments; in text they are written \\uXXXX";
 
 /// "FILE:LINE", or just what it is called where there are no lines.
 std::string place(const toml::node* node, const std::string& fallback) {
@@ -53,40 +51,6 @@ std::string typeName(const toml::node& node) {
     default:
       return "a date or time";
   }
-}
-
-/// Finds letters that are not ASCII outside of comments. toml++ looks some of them up in tables of white
-/// space where they are undefined behaviour, in strings too while it looks for the end of a damaged value.
-/// True: there are none. False: `line` has the first. In what is no TOML the end of a line ends a string, as
-/// toml++ stops there.
-bool isPlainOutsideComments(std::string_view text, std::size_t* line) {
-  constexpr std::string_view kByteOrderMark = "\xef\xbb\xbf";
-  std::string_view closing;  // what ends the string that is open
-  *line = 1;
-  for (std::size_t i = text.starts_with(kByteOrderMark) ? kByteOrderMark.size() : 0; i < text.size(); ++i) {
-    const char c = text[i];
-    if (static_cast<unsigned char>(c) > 0x7f) return false;
-    if (c == '\n') {
-      ++*line;
-      if (closing.size() == 1) closing = {};
-    } else if (!closing.empty()) {
-      if (c == '\\' && closing.front() == '"' && i + 1 < text.size() && text[i + 1] != '\n') {
-        ++i;
-      } else if (text.substr(i).starts_with(closing)) {
-        // Up to two more quotes in front of the closing three belong to the string.
-        while (closing.size() == 3 && text.substr(i + 1).starts_with(closing)) ++i;
-        i += closing.size() - 1;
-        closing = {};
-      }
-    } else if (c == '#') {
-      i = std::min(text.find('\n', i), text.size()) - 1;
-    } else if (c == '"' || c == '\'') {
-      const std::string_view three = c == '"' ? "\"\"\"" : "'''";
-      closing = text.substr(i).starts_with(three) ? three : three.substr(0, 1);
-      i += closing.size() - 1;
-    }
-  }
-  return true;
 }
 
 }  // namespace
@@ -252,11 +216,6 @@ void mergeTables(toml::table& into, toml::table&& from) {
 }
 
 bool parseToml(std::string_view text, const std::string& source, toml::table* table, Problems* problems) {
-  std::size_t line = 0;
-  if (!isPlainOutsideComments(text, &line)) {
-    problems->AddText(source + ":" + std::to_string(line) + ": " + kForeignLetters);
-    return false;
-  }
   toml::parse_result result = toml::parse(text, source);
   if (!result) {
     const toml::parse_error& error = result.error();
@@ -277,16 +236,9 @@ bool parseOverride(const std::string& text, toml::table* table, Problems* proble
     return false;
   }
   const std::string value = text.substr(equals + 1);
-  std::size_t line = 0;
   // What is no TOML value by itself is text that nobody wanted to quote.
-  const bool isValue =
-      isPlainOutsideComments(value, &line) && static_cast<bool>(toml::parse("value = " + value));
-  const std::string assignment = key + " = " + (isValue ? value : quoted(value));
-  if (!isPlainOutsideComments(assignment, &line)) {
-    problems->AddText(source + ": " + kForeignLetters);
-    return false;
-  }
-  toml::parse_result result = toml::parse(assignment, source);
+  const bool isValue = static_cast<bool>(toml::parse("value = " + value));
+  toml::parse_result result = toml::parse(key + " = " + (isValue ? value : quoted(value)), source);
   if (!result) {
     problems->AddText(source + ": " + std::string(result.error().description()));
     return false;

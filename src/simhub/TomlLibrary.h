@@ -1,11 +1,12 @@
 // toml++, header-only, without exceptions.
 //
 // Its assertions are about its input too: "[[[" would end the process, or with some compilers be assumed
-// away. With the assertions off, the parser goes on to report an error. And where it asks whether a character is a
-// blank, letters such as "É" reach what it holds for unreachable: the answer there is no.
+// away. With the assertions off, the parser goes on to report an error. And where it asks whether a character
+// is a blank, letters such as "É" reach what it holds for unreachable: the answer there is no.
+// The order of what follows matters.
 #pragma once
 
-// clang-format off: the order matters
+// clang-format off
 #define TOML_HEADER_ONLY 1
 #define TOML_EXCEPTIONS 0
 #define TOML_ASSERT(expr) static_assert(true)
