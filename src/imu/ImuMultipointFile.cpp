@@ -139,14 +139,19 @@ FileResult appendCalibrationInfo(const ImuCalibrationInfo& info, const std::stri
   return file.append(info.ToString() + '\n') ? FileResult::kOk : FileResult::kFailed;
 }
 
+std::vector<ImuCalibrationInfo> parseCalibrationInfos(const std::string& content) {
+  std::vector<ImuCalibrationInfo> infos;
+  std::istringstream stream(content);
+  for (std::string line; std::getline(stream, line);) infos.emplace_back(line);
+  return infos;
+}
+
 FileResult readCalibrationInfos(const std::string& path, std::vector<ImuCalibrationInfo>* infos) {
   infos->clear();
   std::string content;
   const FileResult result = readFile(path, &content);
-  if (result != FileResult::kOk) return result;
-  std::istringstream stream(content);
-  for (std::string line; std::getline(stream, line);) infos->emplace_back(line);
-  return FileResult::kOk;
+  if (result == FileResult::kOk) *infos = parseCalibrationInfos(content);
+  return result;
 }
 
 FileResult appendPosition(const ImuPosition& position, const std::string& path, FileStart start) {
@@ -159,15 +164,19 @@ FileResult appendPosition(const ImuPosition& position, const std::string& path, 
   return file.append(record) ? FileResult::kOk : FileResult::kFailed;
 }
 
-FileResult readPositions(const std::string& path, std::vector<ImuPosition>* positions) {
+FileResult parsePositions(const std::string& content, std::vector<ImuPosition>* positions) {
   positions->clear();
-  std::string content;
-  const FileResult result = readFile(path, &content);
-  if (result != FileResult::kOk) return result;
   for (std::size_t at = 0; at + kPositionBytes <= content.size(); at += kPositionBytes) {
     const char* const record = content.data() + at;
     positions->push_back({floatsAt(record, 3), floatsAt(record + 3 * sizeof(float), 3),
                           floatsAt(record + 6 * sizeof(float), 1)});
   }
   return content.size() % kPositionBytes == 0 ? FileResult::kOk : FileResult::kIncomplete;
+}
+
+FileResult readPositions(const std::string& path, std::vector<ImuPosition>* positions) {
+  positions->clear();
+  std::string content;
+  const FileResult result = readFile(path, &content);
+  return result == FileResult::kOk ? parsePositions(content, positions) : result;
 }

@@ -57,7 +57,8 @@ inline constexpr std::size_t kMaxImuFileBytes = 1024 * 1024;
 /// null, tells).
 [[nodiscard]] FileResult appendCalibrationInfo(const ImuCalibrationInfo& info, const std::string& path,
                                                bool* dropped = nullptr);
-/// Every line of the file, empty ones too, in its order.
+/// Every line, empty ones too, in its order.
+[[nodiscard]] std::vector<ImuCalibrationInfo> parseCalibrationInfos(const std::string& content);
 [[nodiscard]] FileResult readCalibrationInfos(const std::string& path,
                                               std::vector<ImuCalibrationInfo>* infos);
 
@@ -66,4 +67,6 @@ enum class FileStart { kKeep, kTruncate };
 /// reader to report: nothing in the bytes tells where a record begins.
 [[nodiscard]] FileResult appendPosition(const ImuPosition& position, const std::string& path,
                                         FileStart start);
+/// kOk or kIncomplete; `positions` are those that are whole in either case.
+[[nodiscard]] FileResult parsePositions(const std::string& content, std::vector<ImuPosition>* positions);
 [[nodiscard]] FileResult readPositions(const std::string& path, std::vector<ImuPosition>* positions);
