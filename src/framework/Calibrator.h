@@ -12,6 +12,7 @@
 #include <map>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "framework/DeviceType.h"
@@ -133,6 +134,9 @@ class Calibrator : public ssc::Client {
   /// Says that it writes, and writes the group. 0 or the library's result, logged at level 1 unless left to
   /// the caller.
   [[nodiscard]] int WriteRegistry(const std::string& group, const sns_registry_data& data,
+                                  WriteFailure failure = WriteFailure::kLogged);
+  /// The same for groups that belong together, said once: in their order, up to the first that fails.
+  [[nodiscard]] int WriteRegistry(const std::vector<std::pair<std::string, const sns_registry_data*>>& groups,
                                   WriteFailure failure = WriteFailure::kLogged);
   /// Tells the sensors that their calibration changed; a failure is two warnings, since what was written
   /// stays.

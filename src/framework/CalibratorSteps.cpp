@@ -125,12 +125,22 @@ bool Calibrator::SkipsWrite() const {
 }
 
 int Calibrator::WriteRegistry(const std::string& group, const sns_registry_data& data, WriteFailure failure) {
+  return WriteRegistry({{group, &data}}, failure);
+}
+
+int Calibrator::WriteRegistry(const std::vector<std::pair<std::string, const sns_registry_data*>>& groups,
+                              WriteFailure failure) {
   ssc::say("Writing registry...\n");
-  const int result = ssc::RegistryUtil(connection).Write(group, data);
-  if (result != ssc::kOk && failure == WriteFailure::kLogged) {
-    ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", result);
+  ssc::RegistryUtil registry(connection);
+  for (const auto& [group, data] : groups) {
+    const int result = registry.Write(group, *data);
+    if (result == ssc::kOk) continue;
+    if (failure == WriteFailure::kLogged) {
+      ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", result);
+    }
+    return result;
   }
-  return result;
+  return ssc::kOk;
 }
 
 void Calibrator::NotifyOrWarn(const std::set<ssc::SensorUid>& suids, const char* warning,

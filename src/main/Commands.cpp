@@ -3,6 +3,7 @@
 #include <string_view>
 
 #include "imu/ImuMultipointCalibrator.h"
+#include "imu/ImuThermalCalibrator.h"
 #include "light/AlsCalibrator.h"
 #include "mag/BaroCalibrator.h"
 #include "mag/MagCalibrator.h"
@@ -39,6 +40,7 @@ constexpr Command kCommands[] = {
     {"als", hasClassicAmbientLight, make<AlsCalibrator>},
     {"baro", anyDevice, make<BaroCalibrator>},
     {"imu-multipoint", anyDevice, make<ImuMultipointCalibrator>},
+    {"imu-thermal", anyDevice, make<ImuThermalCalibrator>},
     {"mag", anyDevice, make<MagCalibrator>},
     {"mag-orient", anyDevice, make<MagOrientation>},
     {"mag-sensitivity", anyDevice, make<MagCurrentSensitivity>},

@@ -312,11 +312,11 @@ void Hub::Impl::handleOwn(const Call& call) {
 // ---- Life ----
 
 void Hub::Impl::loadCalibration(Sensor& sensor) {
-  const std::string group = sensor.CalibrationGroup();
-  if (group.empty()) return;
-  sns_registry_data items;
-  if (store_.Read(group, &items) != RegistryStore::Result::kOk) items.Clear();
-  sensor.ApplyCalibration(items);
+  sensor.LoadCalibration([this](const std::string& group) {
+    sns_registry_data items;
+    if (store_.Read(group, &items) != RegistryStore::Result::kOk) items.Clear();
+    return items;
+  });
 }
 
 /// The streams of one chip share its calibration: to tell one of them is to tell all.

@@ -18,10 +18,14 @@ std::optional<float> registryFloat(const sns_registry_data& group, std::string_v
 }
 
 std::vector<float> registryFloats(const sns_registry_data& group, std::string_view name) {
-  std::vector<float> values;
   const Item* const subgroup = findRegistryItem(group, name);
-  if (subgroup == nullptr || subgroup->data_case() != Item::kSubgrp) return values;
-  for (const Item& item : subgroup->subgrp().items()) {
+  if (subgroup == nullptr || subgroup->data_case() != Item::kSubgrp) return {};
+  return registryFloats(subgroup->subgrp());
+}
+
+std::vector<float> registryFloats(const sns_registry_data& group) {
+  std::vector<float> values;
+  for (const Item& item : group.items()) {
     if (item.data_case() == Item::kFlt) values.push_back(item.flt());
   }
   return values;

@@ -18,4 +18,7 @@ namespace simhub {
 /// when there is no such subgroup.
 [[nodiscard]] std::vector<float> registryFloats(const sns_registry_data& group, std::string_view name);
 
+/// The floats of a group that is itself a vector or matrix.
+[[nodiscard]] std::vector<float> registryFloats(const sns_registry_data& group);
+
 }  // namespace simhub

@@ -42,6 +42,11 @@ std::string Sensor::CalibrationGroup() const {
   return packageName(config_.name) + model->calibrationSuffix;
 }
 
+void Sensor::LoadCalibration(const RegistryReader& read) {
+  const std::string group = CalibrationGroup();
+  if (!group.empty()) ApplyCalibration(read(group));
+}
+
 void Sensor::Encode(std::span<const float> values, sns_std_sensor_sample_status status,
                     std::string* payload) {
   event_.clear_data();

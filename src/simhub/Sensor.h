@@ -37,6 +37,9 @@ struct SensorAnswer {
   Time delay{0};  ///< more than the hub's own latency
 };
 
+/// Reads a group of the registry; empty when there is none, or none that can be used.
+using RegistryReader = std::function<sns_registry_data(const std::string& group)>;
+
 /// What the sensors of one hub live in.
 struct SensorSurroundings {
   const World& world;
@@ -65,8 +68,10 @@ class Sensor {
   virtual void Encode(std::span<const float> values, sns_std_sensor_sample_status status,
                       std::string* payload);
 
-  /// The registry's calibration: at the hub's start, and whenever the sensor is told to read it again. An
-  /// empty group is the neutral calibration.
+  /// Takes what the sensor needs from the registry: at the hub's start, and whenever the sensor is told to
+  /// read it again. Here: the group of its calibration, if it has one, for ApplyCalibration.
+  virtual void LoadCalibration(const RegistryReader& read);
+  /// An empty group is the neutral calibration.
   virtual void ApplyCalibration(const sns_registry_data& /*group*/) {}
 
   /// Carries out a request of the sensor's own kind. False: it knows no such request.

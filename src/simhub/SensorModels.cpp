@@ -58,9 +58,9 @@ constexpr SensorModel kModels[] = {
      "rest multiplied by \"corr_mat\"."},
     {"accelerometer", "_0_platform.accel.fac_cal", kImuParameters, make<Accelerometer>,
      "Three values, m/s² by axis: gravity in the handset's pose and other acceleration. Calibration: "
-     "\"corr_mat\" and \"bias\"."},
+     "\"corr_mat\", \"bias\" and the thermal scale."},
     {"gyroscope", "_0_platform.gyro.fac_cal", kImuParameters, make<Gyroscope>,
-     "Three values, rad/s by axis. Calibration: \"corr_mat\" and \"bias\"."},
+     "Three values, rad/s by axis. Calibration: \"corr_mat\", \"bias\" and the thermal scale."},
     {"temperature", "", {}, make<Thermometer>, "One value, the chip's temperature in °C."},
 };
 

@@ -24,6 +24,7 @@ namespace {
 constexpr std::array<const char*, 5> kLevelWords{"ERROR", "WARN", "INFO", "DEBUG", "VERBOSE"};
 constexpr const char* kSayWord = "SAY";
 constexpr mode_t kLogFileMode = 0644;
+constexpr const char* kEraseLine = "\r\x1b[K";  // to the line's start, and clear to its end
 
 /// The log file. Lines come in pieces; each whole line gets its time stamp when its newline arrives, or when
 /// text of another level word cuts it short.
@@ -91,6 +92,7 @@ struct LogState {
   std::mutex mutex;
   std::atomic<int> level{kLogInfo};
   LogFile file;
+  bool statusShown = false;
 };
 
 LogState& state() {
@@ -115,7 +117,17 @@ std::string formatText(const char* format, std::va_list arguments) {
   return text;
 }
 
-void show(std::FILE* stream, const std::string& text) {
+/// The log's mutex is held.
+void eraseStatus(LogState& log) {
+  if (!log.statusShown) return;
+  std::fputs(kEraseLine, stderr);
+  std::fflush(stderr);
+  log.statusShown = false;
+}
+
+/// The log's mutex is held.
+void show(LogState& log, std::FILE* stream, const std::string& text) {
+  eraseStatus(log);
   std::fwrite(text.data(), 1, text.size(), stream);
   if (text.find('\n') != std::string::npos) std::fflush(stream);
 }
@@ -126,7 +138,7 @@ void logText(int level, std::string text) {
   if (text.empty() || text.back() != '\n') text += '\n';
   const std::string line = std::string(word) + ": " + text;
   const std::lock_guard<std::mutex> guard(log.mutex);
-  show(level <= kLogError ? stderr : stdout, line);
+  show(log, level <= kLogError ? stderr : stdout, line);
   log.file.addLines(word, text);
 }
 
@@ -159,7 +171,7 @@ void say(const char* format, ...) {
   va_end(arguments);
   LogState& log = state();
   const std::lock_guard<std::mutex> guard(log.mutex);
-  show(stdout, text);
+  show(log, stdout, text);
   log.file.addLines(kSayWord, text);
 }
 
@@ -185,6 +197,16 @@ void log(int level, const char* format, ...) {
 void logFunc(const char* function, const char* marker) {
   if (logLevel() < kLogVerbose) return;
   logText(kLogVerbose, std::string(function) + " " + marker);
+}
+
+void showStatus(const std::string& text) {
+  LogState& log = state();
+  const std::lock_guard<std::mutex> guard(log.mutex);
+  eraseStatus(log);
+  if (text.empty() || ::isatty(STDERR_FILENO) == 0) return;
+  std::fputs(text.c_str(), stderr);
+  std::fflush(stderr);
+  log.statusShown = true;
 }
 
 }  // namespace ssc

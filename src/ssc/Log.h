@@ -30,4 +30,9 @@ void log(int level, const char* format, ...) __attribute__((format(printf, 2, 3)
 /// Trace (level 4) of a handler's entry ("-->") and exit ("<--").
 void logFunc(const char* function, const char* marker);
 
+/// Shows one line of passing interest at the bottom of the terminal, in place of the one shown before; the
+/// empty text takes it away. Whatever is said or logged takes it away too. Standard error only, and only
+/// where that is a terminal: elsewhere nothing is written. Never in the log file.
+void showStatus(const std::string& text);
+
 }  // namespace ssc

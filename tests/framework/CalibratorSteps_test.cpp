@@ -158,6 +158,31 @@ TEST_F(CalibratorSteps, AFailedWriteIsWarnedAboutUnlessLeftToTheCaller) {
   EXPECT_EQ(left.out, "Writing registry...\n");
 }
 
+TEST_F(CalibratorSteps, GroupsThatBelongTogetherAreAnnouncedOnce) {
+  sns_registry_data scale;
+  addFloatItem(&scale, "x", 3, 1);
+  sns_registry_data bias;
+  addFloatItem(&bias, "x", 4, 1);
+  const Captured captured = capture([&] {
+    return calibrator->WriteRegistry({{"group.scale", &scale}, {"group.bias", &bias}});
+  });
+  EXPECT_EQ(captured.result, 0);
+  EXPECT_EQ(captured.out, "Writing registry...\n");
+  EXPECT_EQ(script->registry["group.scale"].items(0).flt(), 3.0F);
+  EXPECT_EQ(script->registry["group.bias"].items(0).flt(), 4.0F);
+}
+
+TEST_F(CalibratorSteps, AGroupThatCannotBeWrittenKeepsTheFollowingOnesFromBeingWritten) {
+  script->registryWritesFail = true;
+  const sns_registry_data data;
+  const Captured captured = capture([&] {
+    return calibrator->WriteRegistry({{"group.scale", &data}, {"group.bias", &data}});
+  });
+  EXPECT_EQ(captured.result, -5);
+  EXPECT_EQ(captured.out, "Writing registry...\nWARN: Failed to write registry. Error = -5\n");
+  EXPECT_EQ(script->countRequests(HubScript::registrySuid(), 513), 1);
+}
+
 TEST_F(CalibratorSteps, AConfirmedNotificationIsSilent) {
   EXPECT_EQ(capture([&] { calibrator->NotifyOrWarn({a}); }).out, "");
   EXPECT_EQ(script->countRequests(a, 610), 1);

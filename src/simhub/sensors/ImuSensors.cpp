@@ -44,7 +44,8 @@ void ImuSensor::Read(Time time, std::vector<float>* values) {
   Axes reading = Truth(time);
   Err(time, reading);
   addOutlier(&reading);
-  append(withRaw_ || Config().calibrated ? calibrate(reading) : reading, values);
+  const double temperature = TheWorld().ScalarAt(WorldSignal::kTemperature, time);
+  append(withRaw_ || Config().calibrated ? calibrate(reading, temperature) : reading, values);
   if (withRaw_) append(reading, values);
 }
 
@@ -55,9 +56,19 @@ void ImuSensor::addOutlier(Axes* reading) {
   (*reading)[0] += outlierSize_;
 }
 
-ImuSensor::Axes ImuSensor::calibrate(const Axes& reading) const {
+ImuSensor::Axes ImuSensor::calibrate(Axes reading, double temperature) const {
+  for (std::size_t axis = 0; axis < reading.size(); ++axis)
+    reading[axis] -= thermalScale_[axis] * temperature;
   if (biasFirst_) return multiply(correction_, minus(reading, bias_));
   return minus(multiply(correction_, reading), bias_);
+}
+
+void ImuSensor::LoadCalibration(const RegistryReader& read) {
+  Sensor::LoadCalibration(read);
+  const std::vector<float> scale =
+      registryFloats(read(std::string("dynamic.fac_cal.") + ThermalWord() + ".thermal.scale"));
+  thermalScale_ = {};
+  if (scale.size() == thermalScale_.size()) std::copy(scale.begin(), scale.end(), thermalScale_.begin());
 }
 
 void ImuSensor::ApplyCalibration(const sns_registry_data& group) {
