@@ -147,7 +147,10 @@ TEST(FindBumpByTime, IgnoresTheSamplesBehindTheLastWholeGroup) {
 
 TEST(FindBumpByTime, ComparesEachGroupWithTheOneBefore) {
   std::vector<Sample> samples;
-  for (int i = 0; i < 500; ++i) samples.push_back(reading(0.009F * static_cast<float>(i / 50)));
+  for (int i = 0; i < 500; ++i) {
+    const int group = i / 50;
+    samples.push_back(reading(0.009F * static_cast<float>(group)));
+  }
   EXPECT_EQ(findBumpByTime(samples, 50, kThreshold).outcome, Outcome::kNone);
 }
 

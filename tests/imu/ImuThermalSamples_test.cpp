@@ -2,7 +2,6 @@
 
 namespace {
 
-using testing::ElementsAre;
 using testing::EndsWith;
 using testing::FloatNear;
 using testing::HasSubstr;
