@@ -27,7 +27,7 @@ using testing::HasSubstr;
 using testing::SizeIs;
 using SteadyClock = std::chrono::steady_clock;
 
-constexpr std::chrono::seconds kPatience{10};
+constexpr std::chrono::seconds kPatience{120};
 
 /// A client's end of the socket; never blocks.
 class Client {
@@ -205,8 +205,8 @@ TEST_F(SocketServerTest, ClientThatDoesNotReadIsDisconnectedAndHoldsNobodyUp) {
 }
 
 TEST_F(SocketServerTest, SlowReaderGetsEverythingInOrder) {
-  // More than the socket holds, less than the server keeps: 20,000 readings in 2 s of the hub's time.
-  constexpr int kReadings = 20'000;
+  // More than the socket holds, less than the server keeps: 6,000 readings in 0.6 s of the hub's time.
+  constexpr int kReadings = 6'000;
   const auto server = start({"sensor.pressure.rates=[10000]", "fault.f.kind=silent",
                              "fault.f.sensor=pressure", "fault.f.after=" + std::to_string(kReadings)},
                             100);

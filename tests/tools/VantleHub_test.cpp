@@ -24,7 +24,7 @@ using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::StartsWith;
 
-constexpr std::chrono::seconds kPatience{20};
+constexpr std::chrono::seconds kPatience{120};
 
 /// A running vantle-hub; killed with the object.
 class Process {
