@@ -137,8 +137,9 @@ int ImuMultipointCalibrator::runStep() {
 }
 
 int ImuMultipointCalibrator::collect() {
-  const int result = CollectSamples(std::chrono::seconds(seconds_) + kCollectionMargin, false);
-  if (!IsCollected(result)) return result;
+  const int result =
+      RequireCollected(CollectSamples(std::chrono::seconds(seconds_) + kCollectionMargin, false));
+  if (result != ssc::kOk) return result;
   PrintSamples();
   return ssc::kOk;
 }

@@ -279,7 +279,8 @@ int ImuThermalCalibrator::collect() {
   if (!quiet) progress_.Start(connection->clock().now(), duration);
   result = CollectSamples(duration, true);
   progress_.End();
-  return IsCollected(result) ? RequireSamples(imuTemperatureSuid_) : result;
+  result = RequireCollected(result);
+  return result == ssc::kOk ? RequireSamples(imuTemperatureSuid_) : result;
 }
 
 /// A duration that no handset could keep the samples of is refused before it is begun, not after days.

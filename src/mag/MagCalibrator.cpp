@@ -208,8 +208,8 @@ int MagCalibrator::readStored(const sns_registry_data& data, Stored* stored) {
 }
 
 int MagCalibrator::collect() {
-  int result = CollectSamples(std::chrono::seconds(seconds_), true);
-  if (!IsCollected(result)) return result;
+  int result = RequireCollected(CollectSamples(std::chrono::seconds(seconds_), true));
+  if (result != ssc::kOk) return result;
   result = RequireSamples(magSuid_);
   return result == ssc::kOk && DeviceHasMagTemp() ? RequireSamples(temperatureSuid_) : result;
 }
