@@ -4,6 +4,9 @@
 repository=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)
 jobs=${VANTLE_JOBS:-$(nproc)}
 
+# Paths below the repository do not count: another checkout of the same files finds what this one compiled.
+export CCACHE_BASEDIR=$repository CCACHE_NOHASHDIR=1
+
 say() { printf '%s\n' "$*"; }
 
 complain() { printf '%s: %s\n' "$(basename "$0")" "$*" >&2; }
