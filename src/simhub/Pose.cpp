@@ -13,10 +13,10 @@ struct Turn {
 
 /// Multiples of 90° are exact: a handset that lies flat has no trace of gravity on its other axes.
 Turn turnBy(double degrees) {
-  const double quarters = degrees / 90;
+  const double quarters = std::fmod(degrees / 90, 4);
   if (quarters == std::floor(quarters)) {
     constexpr std::array<double, 4> kCosines{1, 0, -1, 0};
-    const auto quarter = static_cast<std::size_t>(static_cast<long long>(quarters) & 3);
+    const auto quarter = static_cast<std::size_t>(static_cast<int>(quarters) & 3);
     return {kCosines[quarter], kCosines[(quarter + 3) & 3]};
   }
   const double radians = degrees * std::numbers::pi / 180;

@@ -6,7 +6,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "simhub/Attitude.h"
+#include "simhub/Pose.h"
 #include "simhub/HubHarness.h"
 
 namespace {
@@ -63,7 +63,7 @@ TEST(ImuSensors, ATiltSharesGravityBetweenAxes) {
 }
 
 TEST(ImuSensors, ATurnOfTheHandsetTurnsTheRoomTheOtherWay) {
-  const simhub::Vector3 north = simhub::roomToHandset({0, 0, 90}, {0, 1, 0});
+  const simhub::Vector3 north = simhub::toHandsetFrame({0, 0, 90}, {0, 1, 0});
   EXPECT_NEAR(north[0], 1, 1e-12);  // its right side, x, now points north
   EXPECT_NEAR(north[1], 0, 1e-12);
 }

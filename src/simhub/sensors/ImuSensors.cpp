@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <numbers>
 
-#include "simhub/Attitude.h"
+#include "simhub/Pose.h"
 #include "simhub/RegistryValues.h"
 
 namespace simhub {
@@ -81,8 +81,8 @@ void ImuSensor::ApplyCalibration(const sns_registry_data& group) {
 }
 
 ImuSensor::Axes Accelerometer::Truth(Time time) const {
-  const Axes pose = firstThree(TheWorld().At(WorldSignal::kPose, time));
-  Axes force = roomToHandset(pose, {0, 0, TheWorld().ScalarAt(WorldSignal::kGravity, time)});
+  Axes force = toHandsetFrame(TheWorld().At(WorldSignal::kPose, time),
+                              {0, 0, TheWorld().ScalarAt(WorldSignal::kGravity, time)});
   const SignalValue other = TheWorld().At(WorldSignal::kAcceleration, time);
   for (std::size_t axis = 0; axis < force.size(); ++axis) force[axis] += other[axis];
   return force;
