@@ -25,25 +25,21 @@ Arguments:
 
 )";
 
-constexpr const char* kGroupSuffix = "_0_platform.als.fac_cal";
 constexpr const char* kScale = "scale";  // float, 1000 is neutral; multiplied by the driver
-constexpr const char* kCorrectionFactor =
-    "corr_factor";  // float, optional; multiplied by readers of the stream
 
-constexpr const char* kAmbientLight = "ambient_light";
 constexpr std::int32_t kRateHz = 10;
 /// Beyond what the samples themselves take: the sensor needs a while to become accurate.
 constexpr std::int32_t kExtraSeconds = 3;
 
-constexpr std::int32_t kDefaultSamples = 5;
 constexpr float kNotGiven = -1.0F;
-constexpr float kMaxPercent = 100.0F;
 constexpr float kMinMeanLux = 1.0F;
-constexpr float kNoCorrection = 1.0F;
 
 }  // namespace
 
-AlsCalibrator::AlsCalibrator(ssc::Connection* hubConnection) : Calibrator(hubConnection, kUsage, kOptions) {}
+AlsCalibrator::AlsCalibrator(ssc::Connection* hubConnection)
+    : AmbientLightCommand(
+          hubConnection, kUsage, kOptions,
+          {.dataType = "ambient_light", .rateHz = kRateHz, .valuesPerEvent = 1, .defaultSamples = 5}) {}
 
 int AlsCalibrator::Run(const Arguments& arguments) {
   if (arguments.reset) return Reset();
@@ -51,52 +47,19 @@ int AlsCalibrator::Run(const Arguments& arguments) {
   if (result == kHelpPrinted) return ssc::kOk;
   if (result == ssc::kOk) result = LookupSuid();
   if (result != ssc::kOk) return result;
-  return verifyPercent > 0 ? Verify() : Calibrate();
-}
-
-void AlsCalibrator::setDefaults() {
-  correctedOnly = false;
-  referenceLux = kNotGiven;
-  sampleCount = kDefaultSamples;
-  verifyPercent = 0;
+  return IsVerifying() ? Verify() : Calibrate();
 }
 
 int AlsCalibrator::ParseArgs(const Arguments& arguments) {
-  setDefaults();
-  CopyGlobalOptions(arguments);
+  SetDefaults(arguments);
+  referenceLux = kNotGiven;
   if (deviceType != DeviceType::o1v1) return UnsupportedDevice(arguments);
-  std::vector<const char*> words;
-  const int result = parseOptions(arguments, &words);
-  return result == ssc::kOk ? parseReference(words) : result;
-}
-
-int AlsCalibrator::parseOptions(const Arguments& arguments, std::vector<const char*>* words) {
   CommandOptions options(arguments, "chs:v:");
   for (int option; (option = options.Next()) != CommandOptions::kEnd;) {
-    switch (option) {
-      case 'c':
-        correctedOnly = true;
-        break;
-      case 'h':
-        PrintUsage(false);
-        return kHelpPrinted;
-      case 's':
-        if (parseInt(options.argument(), &sampleCount) != ssc::kOk || sampleCount <= 0) {
-          return UsageError("SAMPLES must be a positive integer");
-        }
-        break;
-      case 'v':
-        if (parseFloat(options.argument(), &verifyPercent) != ssc::kOk || !(verifyPercent > 0) ||
-            verifyPercent > kMaxPercent) {
-          return UsageError("PERCENT must be in the range (0.0, 100.0]");
-        }
-        break;
-      default:
-        return InvalidOption(arguments, option);
-    }
+    const int result = HandleOption(arguments, option, options.argument());
+    if (result != ssc::kOk) return result;
   }
-  *words = options.words();
-  return ssc::kOk;
+  return parseReference(options.words());
 }
 
 int AlsCalibrator::parseReference(const std::vector<const char*>& words) {
@@ -109,47 +72,6 @@ int AlsCalibrator::parseReference(const std::vector<const char*>& words) {
   return ssc::kOk;
 }
 
-int AlsCalibrator::LookupSuid() {
-  if (!suid.IsZero() && !sensorName.empty()) return ssc::kOk;
-  ssc::say("Searching for ambient light sensor...\n");
-  std::map<std::string, ssc::SensorUid> suids;
-  const int result =
-      LookupSuidsByName({kAmbientLight}, &suids, &sensorName, SNS_STD_SENSOR_STREAM_TYPE_STREAMING);
-  if (result != ssc::kOk) {
-    ssc::log(ssc::kLogError, "Unable to find streaming ambient light sensor");
-    return result;
-  }
-  suid = suids[kAmbientLight];
-  SetSensorInfo(suid, "Ambient Light", static_cast<float>(kRateHz));
-  return ssc::kOk;
-}
-
-std::string AlsCalibrator::groupName() const { return sensorName + kGroupSuffix; }
-
-bool AlsCalibrator::OnSensorEvent(const ssc::SensorUid& eventSuid, std::uint64_t timestamp,
-                                  const sns_std_sensor_event& event) {
-  if (eventSuid != suid) return false;
-  if (hasEnoughSamples()) return true;
-  if (event.status() != SNS_STD_SENSOR_SAMPLE_STATUS_ACCURACY_HIGH) {
-    ssc::log(ssc::kLogDebug, "Dropping ALS sample (%.3f)", static_cast<double>(event.data(0)));
-    return false;
-  }
-  Calibrator::OnSensorEvent(eventSuid, timestamp, event);
-  return hasEnoughSamples();
-}
-
-bool AlsCalibrator::hasEnoughSamples() const {
-  const auto collected = samples.find(suid);
-  return collected != samples.end() && collected->second.size() >= static_cast<std::size_t>(sampleCount);
-}
-
-float AlsCalibrator::correctionFactorOf(const sns_registry_data& data) const {
-  if (correctedOnly || ssc::RegistryUtil::FindDataItem(kCorrectionFactor, data) == nullptr) {
-    return kNoCorrection;
-  }
-  return floatItem(kCorrectionFactor, data);
-}
-
 int AlsCalibrator::Calibrate() {
   ssc::say("ALS calibration begins at %.3f lux.\n", static_cast<double>(referenceLux));
   return Conclude("ALS calibration", measureAndStore());
@@ -158,9 +80,9 @@ int AlsCalibrator::Calibrate() {
 int AlsCalibrator::measureAndStore() {
   ssc::say("Reading registry...\n");
   sns_registry_data data;
-  int result = ssc::RegistryUtil(connection).Read(groupName(), &data);
+  int result = ssc::RegistryUtil(connection).Read(GroupName(), &data);
   if (result != ssc::kOk) return result;
-  const float correctionFactor = correctionFactorOf(data);
+  const float correctionFactor = CorrectionFactorOf(data);
   result = requireItem(kScale, data);
   if (result != ssc::kOk) return result;
   const float previousScale = floatItem(kScale, data);
@@ -194,12 +116,8 @@ int AlsCalibrator::measure(float correctionFactor, float* mean) {
   const int result = collect(correctionFactor);
   if (result != ssc::kOk) return result;
   const LuxMeasurement measurement = measureLux(samples[suid]);
-  ssc::say("MEAN:  %14.6f\n", static_cast<double>(measurement.mean));
-  if (sampleCount >= 2) ssc::say("STDEV: %14.6f\n", static_cast<double>(measurement.stdev));
   *mean = measurement.mean;
-  // An infinite mean would make a harmless looking scale of 0; one that is not a number would pass every
-  // comparison.
-  return RequireFinite("The mean of the ambient light", {measurement.mean});
+  return ReportMeasurement(measurement);
 }
 
 void AlsCalibrator::reportPreviousScale(float previousScale) const {
@@ -211,12 +129,12 @@ void AlsCalibrator::reportPreviousScale(float previousScale) const {
 
 int AlsCalibrator::store(float scale, sns_registry_data* data) {
   setFloatItem(kScale, scale, data);
-  int result = WriteRegistry(groupName(), *data, WriteFailure::kLeftToCaller);
+  int result = WriteRegistry(GroupName(), *data, WriteFailure::kLeftToCaller);
   if (result != ssc::kOk) return result;
   ssc::log(ssc::kLogDebug, "Notifying ALS of completed calibration");
   // Unlike in most commands this failure is the command's, although the scale is stored: the line has to
   // reboot the handset before it goes on.
-  result = requestReread();
+  result = RequestReread();
   if (result != ssc::kOk) {
     ssc::log(ssc::kLogWarn,
              "ALS notification failed; device may require reboot for calibration to take effect");
@@ -224,47 +142,24 @@ int AlsCalibrator::store(float scale, sns_registry_data* data) {
   return result;
 }
 
-/// The factory test makes the sensor read its calibration again. Its answer is not waited for.
-int AlsCalibrator::requestReread() { return SendRequest(MakeFactoryTestRequest(suid)); }
-
 int AlsCalibrator::Verify() {
   ssc::say("Verifying ALS calibration at %.3f lux.\n", static_cast<double>(referenceLux));
   return Conclude("ALS verification", measureAndCompare());
 }
 
 int AlsCalibrator::measureAndCompare() {
-  float correctionFactor = kNoCorrection;
-  if (!correctedOnly) {
-    ssc::say("Reading registry...\n");
-    sns_registry_data data;
-    const int result = ssc::RegistryUtil(connection).Read(groupName(), &data);
-    if (result != ssc::kOk) return result;
-    correctionFactor = correctionFactorOf(data);
-  }
-  float mean = 0;
-  const int result = measure(correctionFactor, &mean);
+  float correctionFactor = 0;
+  int result = ReadCorrectionFactor(&correctionFactor);
   if (result != ssc::kOk) return result;
-  const float difference = luxDifferencePercent(mean, referenceLux);
-  ssc::say("DIFF:  %14.6f%%\n", static_cast<double>(difference));
-  if (isWithinTolerance(difference, verifyPercent)) return ssc::kOk;
-  ssc::say("Difference exceeds |%.3f%%| tolerance.\n", static_cast<double>(verifyPercent));
-  return ssc::kInvalid;
+  float mean = 0;
+  result = measure(correctionFactor, &mean);
+  return result == ssc::kOk ? CompareWithReference(mean, referenceLux) : result;
 }
 
 int AlsCalibrator::Reset() {
-  int result = LookupSuid();
-  if (result != ssc::kOk) return result;
-  ssc::RegistryUtil registry(connection);
-  sns_registry_data data;
-  result = registry.Read(groupName(), &data);
-  if (result != ssc::kOk) return result;
-  ssc::say("Resetting ALS calibration...\n");
-  result = requireItem(kScale, data);
-  if (result != ssc::kOk) return result;
-  setFloatItem(kScale, kNeutralLuxScale, &data);
-  result = registry.Write(groupName(), data);
-  if (result != ssc::kOk) return result;
-  result = requestReread();
-  if (result != ssc::kOk) ssc::say("Reboot device for default calibration to take effect.\n");
-  return result;
+  return RestoreDefaults([](sns_registry_data* data) {
+    const int result = requireItem(kScale, *data);
+    if (result == ssc::kOk) setFloatItem(kScale, kNeutralLuxScale, data);
+    return result;
+  });
 }
