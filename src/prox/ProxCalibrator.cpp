@@ -4,9 +4,7 @@
 #include <cstring>
 
 #include "framework/CommandOptions.h"
-#include "framework/ParseNumber.h"
 #include "framework/RegistryItems.h"
-#include "ssc/AttrUtil.h"
 #include "ssc/Log.h"
 #include "ssc/RegistryUtil.h"
 #include "ssc/Ticks.h"
@@ -25,8 +23,6 @@ Arguments:
   far          Perform calibration for the far threshold.
 
 )";
-
-constexpr const char* kGroupSuffix = "_0_platform.prox.fac_cal";
 
 /// What one mode calls its threshold.
 struct ThresholdNames {
@@ -47,20 +43,16 @@ constexpr const ThresholdNames& otherNamesOf(ProximityMode mode) {
 constexpr float kDefaultNearThreshold = 140.0F;
 constexpr float kDefaultFarThreshold = 100.0F;
 
-constexpr const char* kProximity = "proximity";
-/// A sensor's own event id: the registry sensor's write event has the same number.
-constexpr std::uint32_t kProximityEvent = 769;
-constexpr std::int32_t kRateHz = 50;
-/// Beyond what the samples themselves take: the sensor needs a while to become accurate.
-constexpr std::int32_t kExtraSeconds = 3;
-
 constexpr std::int32_t kDefaultSamples = 10;
-constexpr float kDefaultRangeHigh = 5.0F;
 
 }  // namespace
 
 ProxCalibrator::ProxCalibrator(ssc::Connection* hubConnection)
-    : Calibrator(hubConnection, kUsage, kOptions) {}
+    : ProximityCommand(hubConnection, kUsage, kOptions,
+                       {.dataType = "proximity",
+                        .displayName = "Proximity",
+                        .lookupFailure = "Unable to lookup streaming proximity sensor",
+                        .rateHz = 50}) {}
 
 int ProxCalibrator::Run(const Arguments& arguments) {
   if (arguments.reset) return Reset();
@@ -71,25 +63,13 @@ int ProxCalibrator::Run(const Arguments& arguments) {
 }
 
 int ProxCalibrator::ParseArgs(const Arguments& arguments) {
-  rangeHigh_ = kDefaultRangeHigh;
+  SetDefaults(arguments, kDefaultSamples);
   mode_ = ProximityMode::kNear;
-  sampleCount_ = kDefaultSamples;
-  CopyGlobalOptions(arguments);
 
   CommandOptions options(arguments, "hs:");
   for (int option; (option = options.Next()) != CommandOptions::kEnd;) {
-    switch (option) {
-      case 'h':
-        PrintUsage(false);
-        return kHelpPrinted;
-      case 's':
-        if (parseInt(options.argument(), &sampleCount_) != ssc::kOk || sampleCount_ < 1) {
-          return UsageError("SAMPLES must be a positive integer");
-        }
-        break;
-      default:
-        return InvalidOption(arguments, option);
-    }
+    const int result = HandleOption(arguments, option, options.argument());
+    if (result != ssc::kOk) return result;
   }
 
   const auto& words = options.words();
@@ -103,31 +83,6 @@ int ProxCalibrator::ParseArgs(const Arguments& arguments) {
   return ssc::kOk;
 }
 
-int ProxCalibrator::LookupSuid() {
-  if (!suid_.IsZero() && !sensorName_.empty()) return ssc::kOk;
-  ssc::say("Searching for proximity sensor...\n");
-  std::map<std::string, ssc::SensorUid> suids;
-  const int result =
-      LookupSuidsByName({kProximity}, &suids, &sensorName_, SNS_STD_SENSOR_STREAM_TYPE_STREAMING);
-  if (result != ssc::kOk) {
-    ssc::log(ssc::kLogError, "Unable to lookup streaming proximity sensor");
-    return result;
-  }
-  suid_ = suids[kProximity];
-  SetSensorInfo(suid_, "Proximity", static_cast<float>(kRateHz));
-
-  // The range only says which distance is printed for a far target: without it the default does.
-  sns_std_attr_event attributes;
-  if (ssc::AttrUtil(connection).LoadAttributes(suid_, &attributes) == ssc::kOk) {
-    float low = 0;
-    float high = 0;
-    if (ssc::AttrUtil::GetSelectedRange(attributes, &low, &high) == ssc::kOk) rangeHigh_ = high;
-  }
-  return ssc::kOk;
-}
-
-std::string ProxCalibrator::groupName() const { return sensorName_ + kGroupSuffix; }
-
 void ProxCalibrator::OnEvent(const sns_client_event_msg& message) {
   constexpr const char* kFunction = "virtual void ProxCalibrator::OnEvent(const sns_client_event_msg &)";
   ssc::logFunc(kFunction, "-->");
@@ -137,23 +92,17 @@ void ProxCalibrator::OnEvent(const sns_client_event_msg& message) {
 }
 
 bool ProxCalibrator::takeEvents(const sns_client_event_msg& message) {
-  if (ssc::SensorUid(message.suid()) != suid_ || hasEnoughSamples()) return false;
+  if (!IsFromSensor(message) || hasEnoughSamples()) return false;
   float distance = 0;  // what a near target counts as, until a far event of the same message
   for (const auto& event : message.events()) {
     if (event.msg_id() != kProximityEvent) continue;
-    if (!event_.ParseFromString(event.payload())) {
-      // Fails the collection, but does not end it before its time or count.
-      ssc::log(ssc::kLogError, "Received malformed proximity event");
-      status = ssc::kMalformed;
-      continue;
-    }
-    if (event_.proximity_event_type() == SNS_PROXIMITY_EVENT_TYPE_FAR) distance = rangeHigh_;
-    if (event_.status() != SNS_STD_SENSOR_SAMPLE_STATUS_ACCURACY_HIGH) {
-      ssc::log(ssc::kLogDebug, "Dropping proximity sample (%d)", event_.status());
-      continue;
-    }
-    const std::array<float, 3> values{static_cast<float>(event_.raw_adc()), distance,
-                                      event_.data_size() > 0 ? event_.data(0) : 0.0F};
+    const sns_proximity_event* const reading = ParseReading(event.payload());
+    // One that does not parse fails the collection, but does not end it before its time or count.
+    if (reading == nullptr) continue;
+    if (reading->proximity_event_type() == SNS_PROXIMITY_EVENT_TYPE_FAR) distance = rangeHigh_;
+    if (!IsAccurate(*reading)) continue;
+    const std::array<float, 3> values{static_cast<float>(reading->raw_adc()), distance,
+                                      reading->data_size() > 0 ? reading->data(0) : 0.0F};
     samples[suid_].emplace_back(ssc::ticksToSeconds(event.timestamp()), values.begin(), values.end());
     if (hasEnoughSamples()) return true;
   }
@@ -162,7 +111,8 @@ bool ProxCalibrator::takeEvents(const sns_client_event_msg& message) {
 
 bool ProxCalibrator::hasEnoughSamples() const {
   const auto collected = samples.find(suid_);
-  return collected != samples.end() && collected->second.size() >= static_cast<std::size_t>(sampleCount_);
+  return collected != samples.end() &&
+         collected->second.size() >= static_cast<std::size_t>(samplesToCollect_);
 }
 
 int ProxCalibrator::Calibrate() {
@@ -171,24 +121,17 @@ int ProxCalibrator::Calibrate() {
 }
 
 int ProxCalibrator::measureAndStore() {
-  const int result = collect();
+  int result = CollectReadings(Printing::kSamples);
+  if (result == ssc::kOk) result = RequireSamples(suid_);
   if (result != ssc::kOk) return result;
   const float threshold = proximityThreshold(samples[suid_]);
   ssc::say("%s_THRESHOLD: %.0f\n", namesOf(mode_).printed, static_cast<double>(threshold));
   return SkipsWrite() ? ssc::kOk : store(threshold);
 }
 
-int ProxCalibrator::collect() {
-  const int result = CollectSamples(std::chrono::seconds(sampleCount_ / kRateHz + kExtraSeconds), true);
-  if (result == ssc::kTimedOut) {
-    ssc::log(ssc::kLogError, "Timed out waiting for proximity sensor samples");
-  }
-  return result == ssc::kOk ? RequireSamples(suid_) : result;
-}
-
 int ProxCalibrator::store(float threshold) {
   sns_registry_data data;
-  int result = ssc::RegistryUtil(connection).Read(groupName(), &data);
+  int result = ssc::RegistryUtil(connection).Read(GroupName(), &data);
   if (result == ssc::kOk) result = keepApart(threshold, &data);
   if (result != ssc::kOk) return result;
 
@@ -197,13 +140,13 @@ int ProxCalibrator::store(float threshold) {
   result = requireItem(own, data);
   if (result != ssc::kOk) return result;
   setFloatItem(own, threshold, &data);
-  result = WriteRegistry(groupName(), data);
+  result = WriteRegistry(GroupName(), data);
   if (result != ssc::kOk) return result;
 
   ssc::log(ssc::kLogDebug, "Notifying proximity sensor of completed calibration");
   // Unlike in most commands this failure is the command's, although the threshold is stored: the line has to
   // reboot the handset before it goes on.
-  result = requestReread();
+  result = RequestReread();
   if (result != ssc::kOk) {
     ssc::log(ssc::kLogWarn, "Notification failed; device may require reboot for calibration to take effect");
   }
@@ -218,20 +161,17 @@ int ProxCalibrator::keepApart(float threshold, sns_registry_data* data) {
   if (!displaced) return ssc::kOk;
   ssc::say("Set default threshold with MIN_DIFF\n");
   setFloatItem(other, *displaced, data);
-  const int written = ssc::RegistryUtil(connection).Write(groupName(), *data);
+  const int written = ssc::RegistryUtil(connection).Write(GroupName(), *data);
   if (written != ssc::kOk) ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", written);
   return written;
 }
-
-/// The factory test makes the sensor read its calibration again. Its answer is not waited for.
-int ProxCalibrator::requestReread() { return SendRequest(MakeFactoryTestRequest(suid_)); }
 
 int ProxCalibrator::Reset() {
   int result = LookupSuid();
   if (result != ssc::kOk) return result;
   ssc::RegistryUtil registry(connection);
   sns_registry_data data;
-  result = registry.Read(groupName(), &data);
+  result = registry.Read(GroupName(), &data);
   if (result != ssc::kOk) return result;
   ssc::say("Resetting proximity sensor calibration...\n");
   for (const ThresholdNames& names : {kNear, kFar}) {
@@ -240,9 +180,5 @@ int ProxCalibrator::Reset() {
   }
   setFloatItem(kNear.item, kDefaultNearThreshold, &data);
   setFloatItem(kFar.item, kDefaultFarThreshold, &data);
-  result = registry.Write(groupName(), data);
-  if (result != ssc::kOk) return result;
-  result = requestReread();
-  if (result != ssc::kOk) ssc::say("Reboot device for default calibration to take effect.\n");
-  return result;
+  return StoreDefaults(registry, data);
 }

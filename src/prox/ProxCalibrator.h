@@ -1,14 +1,11 @@
 #pragma once
 
-#include <string>
-
-#include "framework/Calibrator.h"
-#include "proto/sns_proximity.pb.h"
+#include "prox/ProximityCommand.h"
 #include "prox/ProximityThresholds.h"
 
 /// "prox" of handsets whose proximity sensor decides near and far by two thresholds: sets one of them to what
 /// the sensor reads with a target at that distance, and keeps the other apart from it.
-class ProxCalibrator final : public Calibrator {
+class ProxCalibrator final : public ProximityCommand {
  public:
   explicit ProxCalibrator(ssc::Connection* hubConnection);
 
@@ -16,7 +13,6 @@ class ProxCalibrator final : public Calibrator {
   /// Restores the default thresholds. Knows no dry run.
   [[nodiscard]] int Reset();
   [[nodiscard]] int ParseArgs(const Arguments& arguments);
-  [[nodiscard]] int LookupSuid();
   [[nodiscard]] int Calibrate();
 
   /// Keeps proximity events of high accuracy as samples of three values: raw counts, distance, and whatever
@@ -24,23 +20,15 @@ class ProxCalibrator final : public Calibrator {
   void OnEvent(const sns_client_event_msg& message) override;
 
  private:
-  [[nodiscard]] std::string groupName() const;
   [[nodiscard]] bool hasEnoughSamples() const;
   /// Whether the wait is to end.
   [[nodiscard]] bool takeEvents(const sns_client_event_msg& message);
 
   /// Calibrate without its first and last line.
   [[nodiscard]] int measureAndStore();
-  [[nodiscard]] int collect();
   [[nodiscard]] int store(float threshold);
   /// Moves and writes the other mode's threshold when it is too close to the new one.
   [[nodiscard]] int keepApart(float threshold, sns_registry_data* data);
-  [[nodiscard]] int requestReread();
 
-  float rangeHigh_ = 0;  ///< the sensor's selected range: what a far event counts as distance
   ProximityMode mode_ = ProximityMode::kNear;
-  std::int32_t sampleCount_ = 0;
-  std::string sensorName_;  ///< the sensor's package
-  ssc::SensorUid suid_;
-  sns_proximity_event event_;  ///< guarded by mutex: the event at hand, kept for its buffer
 };
