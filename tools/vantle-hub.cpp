@@ -127,7 +127,7 @@ int serve(const Arguments& arguments, simhub::Scenario scenario) {
   std::string error;
   const std::string root = simhub::simulatedRoot(&error);
   if (root.empty() || !simhub::prepareSimulatedRoot(root, &error)) return fail(error);
-  options.registryFolder = simhub::registryFolder(root);
+  options.files = simhub::hubFiles(root);
 
   const int stop = openStopSignals();
   if (stop < 0) return fail(std::string("signals: ") + std::strerror(errno));

@@ -46,7 +46,7 @@ class IncomingQueue {
 class EmbeddedSimulatedHub final : public ssc::EmbeddedHub, public simhub::HubOutput {
  public:
   [[nodiscard]] bool Start(simhub::Scenario scenario, const std::string& root, std::string* error) {
-    hub_ = simhub::Hub::Create(std::move(scenario), simhub::registryFolder(root), *this, error);
+    hub_ = simhub::Hub::Create(std::move(scenario), simhub::hubFiles(root), *this, error);
     if (hub_ == nullptr) return false;
     client_ = hub_->AddClient();
     return true;

@@ -16,11 +16,11 @@ SensorConfig serviceConfig(const char* dataType) {
 
 }  // namespace
 
-Directory::Directory(const Scenario& scenario, const SensorMaker& makeSensor)
+Directory::Directory(const Scenario& scenario, const std::string& te2Table, const SensorMaker& makeSensor)
     : registryConfig_(serviceConfig(kRegistryDataType)),
       lookupConfig_(serviceConfig(kSuidDataType)),
       registrySuid_(suidForName(kRegistryDataType)) {
-  const SensorSurroundings surroundings{scenario.world, scenario.hub.seed};
+  const SensorSurroundings surroundings{scenario.world, scenario.hub.seed, te2Table};
   for (const SensorConfig& config : scenario.sensors) sensors_.push_back(makeSensor(config, surroundings));
   for (std::uint32_t i = 0; i < Count(); ++i) bySuid_[SuidOf(i)] = i;
 }

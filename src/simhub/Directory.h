@@ -6,6 +6,7 @@
 #include <map>
 #include <memory>
 #include <optional>
+#include <string>
 #include <vector>
 
 #include "simhub/FaultPlan.h"
@@ -17,8 +18,8 @@ namespace simhub {
 
 class Directory {
  public:
-  /// Makes the sensors. The scenario outlives the directory.
-  Directory(const Scenario& scenario, const SensorMaker& makeSensor);
+  /// Makes the sensors. The scenario outlives the directory. `te2Table` is as in HubFiles.
+  Directory(const Scenario& scenario, const std::string& te2Table, const SensorMaker& makeSensor);
 
   /// All addressees' indices are below this, the sensors' first.
   [[nodiscard]] std::uint32_t Count() const { return static_cast<std::uint32_t>(sensors_.size()) + 2; }

@@ -21,6 +21,7 @@ namespace simhub {
 namespace {
 
 constexpr const char* kRegistryFolder = "/mnt/vendor/persist/sensors/registry/registry";
+constexpr const char* kTe2Table = "/sys/devices/platform/soc/soc:qcom,dsi-display-primary/te2_table";
 
 Time later(Time time, Time by) { return time + std::min(by, kNever - std::min(time, kNever)); }
 
@@ -28,7 +29,7 @@ Time later(Time time, Time by) { return time + std::min(by, kNever - std::min(ti
 
 class Hub::Impl {
  public:
-  Impl(Scenario scenario, const std::string& folder, HubOutput& output, const SensorMaker& makeSensor);
+  Impl(Scenario scenario, const HubFiles& files, HubOutput& output, const SensorMaker& makeSensor);
 
   [[nodiscard]] int OpenLog() { return log_.Open(scenario_.hub.requestLog); }
   [[nodiscard]] const std::string& LogPath() const { return scenario_.hub.requestLog; }
@@ -100,14 +101,13 @@ class Hub::Impl {
   sns_client_request_msg message_;  // the request at hand, reused
 };
 
-Hub::Impl::Impl(Scenario scenario, const std::string& folder, HubOutput& output,
-                const SensorMaker& makeSensor)
+Hub::Impl::Impl(Scenario scenario, const HubFiles& files, HubOutput& output, const SensorMaker& makeSensor)
     : scenario_(std::move(scenario)),
       output_(output),
-      directory_(scenario_, makeSensor),
+      directory_(scenario_, files.te2Table, makeSensor),
       outbox_(output, queue_, statistics_, scenario_.hub.startTicks),
       faults_(scenario_.faults, directory_.Names()),
-      files_(folder),
+      files_(files.registryFolder),
       store_(files_, scenario_.registry, [&output](const std::string& text) { output.Diagnostic(text); }),
       registry_(store_, files_, faults_),
       departures_(faults_.Departures()),
@@ -379,9 +379,9 @@ void Hub::Impl::Step() {
 
 // ---- The outside ----
 
-std::unique_ptr<Hub> Hub::Create(Scenario scenario, const std::string& registryFolder, HubOutput& output,
+std::unique_ptr<Hub> Hub::Create(Scenario scenario, const HubFiles& files, HubOutput& output,
                                  std::string* error, const SensorMaker& makeSensor) {
-  auto impl = std::make_unique<Impl>(std::move(scenario), registryFolder, output, makeSensor);
+  auto impl = std::make_unique<Impl>(std::move(scenario), files, output, makeSensor);
   if (!impl->LogPath().empty()) {
     if (const int failure = impl->OpenLog(); failure != 0) {
       *error = "hub.request_log: " + impl->LogPath() + ": " + std::strerror(failure);
@@ -416,6 +416,6 @@ void Hub::AdvanceTo(Time time) {
 
 const HubStatistics& Hub::Statistics() const { return impl_->Statistics(); }
 
-std::string registryFolder(const std::string& root) { return root + kRegistryFolder; }
+HubFiles hubFiles(const std::string& root) { return {root + kRegistryFolder, root + kTe2Table}; }
 
 }  // namespace simhub

@@ -31,6 +31,12 @@ class HubOutput {
   virtual void Diagnostic(const std::string& text) = 0;
 };
 
+/// What of the handset's file system the hub uses.
+struct HubFiles {
+  std::string registryFolder;  ///< of the registry's groups; created when missing
+  std::string te2Table{};      ///< node of the display's TE2 table; empty: there is none
+};
+
 struct HubStatistics {
   std::uint64_t requests = 0;
   std::uint64_t malformedDatagrams = 0;
@@ -40,10 +46,9 @@ struct HubStatistics {
 
 class Hub {
  public:
-  /// Makes and starts a hub whose registry files stand in the folder `registryFolder` (created when missing).
-  /// Null, with `error` set, when the request log cannot be opened. `output` outlives the hub. Other sensors
-  /// than those of the scenario's models come from `makeSensor`.
-  [[nodiscard]] static std::unique_ptr<Hub> Create(Scenario scenario, const std::string& registryFolder,
+  /// Makes and starts a hub. Null, with `error` set, when the request log cannot be opened. `output` outlives
+  /// the hub. Other sensors than those of the scenario's models come from `makeSensor`.
+  [[nodiscard]] static std::unique_ptr<Hub> Create(Scenario scenario, const HubFiles& files,
                                                    HubOutput& output, std::string* error,
                                                    const SensorMaker& makeSensor = simhub::makeSensor);
   ~Hub();
@@ -72,7 +77,7 @@ class Hub {
   std::unique_ptr<Impl> impl_;
 };
 
-/// The folder of registry files below `root` (the folder put in front of every device path; may be empty).
-[[nodiscard]] std::string registryFolder(const std::string& root);
+/// Those below `root` (the folder put in front of every device path; may be empty).
+[[nodiscard]] HubFiles hubFiles(const std::string& root);
 
 }  // namespace simhub

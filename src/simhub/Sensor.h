@@ -43,7 +43,8 @@ using RegistryReader = std::function<sns_registry_data(const std::string& group)
 /// What the sensors of one hub live in.
 struct SensorSurroundings {
   const World& world;
-  std::uint64_t seed;  ///< the scenario's
+  std::uint64_t seed;      ///< the scenario's
+  std::string te2Table{};  ///< as in HubFiles
 };
 
 class Sensor {

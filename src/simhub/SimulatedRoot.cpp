@@ -14,8 +14,6 @@ namespace simhub {
 namespace {
 
 constexpr const char* kFolderName = "/vantle-sim";
-constexpr const char* kTe2Folder = "/sys/devices/platform/soc/soc:qcom,dsi-display-primary";
-constexpr const char* kTe2Node = "/te2_table";
 
 /// A variable that is set and not empty.
 const char* variable(const char* name) {
@@ -43,15 +41,15 @@ std::string simulatedRoot(std::string* error) {
 }
 
 bool prepareSimulatedRoot(const std::string& root, std::string* error) {
-  const std::string te2Folder = root + kTe2Folder;
+  const HubFiles files = hubFiles(root);
+  const std::string te2Folder = files.te2Table.substr(0, files.te2Table.rfind('/'));
   for (const std::string& folder :
-       {root, root + "/data/app-ephemeral", root + "/persist/sensors", te2Folder, registryFolder(root)}) {
+       {root, root + "/data/app-ephemeral", root + "/persist/sensors", te2Folder, files.registryFolder}) {
     if (!createFolder(folder, error)) return false;
   }
   // The display driver's node: always there on a handset, written but never created by the program.
-  const std::string node = te2Folder + kTe2Node;
-  const int fd = ::open(node.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | O_NONBLOCK, 0644);
-  if (fd < 0) *error = node + ": " + std::strerror(errno);
+  const int fd = ::open(files.te2Table.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | O_NONBLOCK, 0644);
+  if (fd < 0) *error = files.te2Table + ": " + std::strerror(errno);
   if (fd >= 0) (void)::close(fd);
   return fd >= 0;
 }

@@ -53,7 +53,7 @@ std::unique_ptr<SocketServer> SocketServer::Create(const SocketServerOptions& op
                                                    Diagnostics diagnostics, std::string* error) {
   std::unique_ptr<SocketServer> server(new SocketServer(options, std::move(diagnostics)));
   if (!server->listen(error)) return nullptr;
-  server->hub_ = Hub::Create(std::move(scenario), options.registryFolder, *server, error);
+  server->hub_ = Hub::Create(std::move(scenario), options.files, *server, error);
   if (server->hub_ == nullptr) return nullptr;
   server->start_ = Clock::now();
   return server;

@@ -20,7 +20,7 @@ namespace simhub {
 
 struct SocketServerOptions {
   std::string path;  ///< of the socket
-  std::string registryFolder;
+  HubFiles files;
   double speed = 1;  ///< hub seconds per real second, > 0
 };
 

@@ -14,7 +14,8 @@ HubHarness::HubHarness(const std::vector<std::string>& overrides, const std::str
 void HubHarness::Restart() {
   std::string error;
   hub.reset();
-  hub = simhub::Hub::Create(scenario, folder.Path("registry"), *this, &error, makeSensor_);
+  hub = simhub::Hub::Create(scenario, {folder.Path("registry"), folder.Path("te2_table")}, *this, &error,
+                            makeSensor_);
   EXPECT_NE(hub, nullptr) << error;
   client = hub->AddClient();
 }

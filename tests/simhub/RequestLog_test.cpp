@@ -64,7 +64,7 @@ TEST(RequestLog, FileThatCannotBeOpenedIsAnError) {
   HubHarness fine;
   fine.scenario.hub.requestLog = "/nonexistent/log";
   std::string error;
-  EXPECT_EQ(simhub::Hub::Create(fine.scenario, fine.folder.Path("registry"), fine, &error), nullptr);
+  EXPECT_EQ(simhub::Hub::Create(fine.scenario, {fine.folder.Path("registry")}, fine, &error), nullptr);
   EXPECT_EQ(error, "hub.request_log: /nonexistent/log: No such file or directory");
 }
 

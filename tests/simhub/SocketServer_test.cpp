@@ -93,7 +93,7 @@ class SocketServerTest : public testing::Test {
     EXPECT_TRUE(simhub::loadScenario(scenarioName, overrides, &scenario, &error)) << error;
     simhub::SocketServerOptions options;
     options.path = path;
-    options.registryFolder = folder.Path("registry");
+    options.files.registryFolder = folder.Path("registry");
     options.speed = speed;
     return SocketServer::Create(
         options, std::move(scenario), [this](const std::string& text) { diagnostics.push_back(text); },
