@@ -36,6 +36,8 @@ constexpr FaultKindRow kRows[] = {
      "The sensor answers its own requests with a failure."},
     {kOemSilence, "oem_silence", kRequests, "sensor message",
      "The sensor carries its own requests out, but does not answer them."},
+    {kOemMalformed, "oem_malformed", kRequests, "sensor message",
+     "The sensor carries its own requests out, but the payload of its answers cannot be decoded."},
     {kGroupMissing, "group_missing", kRegistry, "group", "A registry group does not exist when it is read."},
     {kItemMissing, "item_missing", kRegistry, "group item",
      "An item is missing from the group that is read."},

@@ -31,6 +31,7 @@ enum class FaultKind {
   kNoNotification,
   kOemFailure,
   kOemSilence,
+  kOemMalformed,
   kGroupMissing,
   kItemMissing,
   kItemKind,
@@ -40,6 +41,9 @@ enum class FaultKind {
   kFullDisk,
   kHubAway,
 };
+
+/// Takes the place of a payload that must not decode, whatever the message: a tag that never ends.
+inline constexpr const char* kUndecodablePayload = "\xff\xff\xff\xff";
 
 /// What a fault acts on: it says which keys it has besides kind, from, until, after and count.
 enum class FaultScope { kEvents, kRequests, kRegistry, kHub };

@@ -66,6 +66,9 @@ void add(const Fault& fault, RequestFaults* faults) {
     case FaultKind::kOemSilence:
       faults->oemSilence = true;
       break;
+    case FaultKind::kOemMalformed:
+      faults->oemMalformed = true;
+      break;
     default:
       break;
   }

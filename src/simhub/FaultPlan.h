@@ -32,6 +32,7 @@ struct RequestFaults {
   bool noNotification = false;
   bool oemFailure = false;
   bool oemSilence = false;
+  bool oemMalformed = false;
 };
 
 /// Addressees are named by their section's key and their data type; a fault names either, or nobody for all.

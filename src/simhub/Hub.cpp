@@ -306,7 +306,10 @@ void Hub::Impl::handleOwn(const Call& call) {
     return;
   }
   if (call.faults.oemSilence) return;
-  for (const SensorAnswer& reply : answers) answer(call, reply.messageId, reply.payload, reply.delay);
+  for (const SensorAnswer& reply : answers) {
+    answer(call, reply.messageId, call.faults.oemMalformed ? kUndecodablePayload : reply.payload,
+           reply.delay);
+  }
 }
 
 // ---- Life ----

@@ -32,6 +32,16 @@ inline constexpr std::uint32_t kProximityEvent = 769;  // of a proximity sensor,
 inline constexpr std::uint32_t kTestEvent = 1026;
 inline constexpr std::uint32_t kCalibrationChangedReply = 1110;
 
+// The light sensor under the display. Each of its requests is answered by the event of the next id.
+inline constexpr std::uint32_t kAlsTriggerRequest = 7800;
+inline constexpr std::uint32_t kAlsAutoGainRequest = 7802;
+inline constexpr std::uint32_t kAlsDelayCalibrationRequest = 7804;
+inline constexpr std::uint32_t kAlsGainCalibrationRequest = 7806;
+inline constexpr std::uint32_t kAlsPwmRequest = 7808;
+inline constexpr std::uint32_t kAlsSetGainRequest = 7810;
+inline constexpr std::uint32_t kAlsSetIntegrationTimeRequest = 7812;
+inline constexpr std::uint32_t kAlsSetGainAndIntegrationTimeRequest = 7814;
+
 // Attributes.
 inline constexpr int kAttributeName = 0;
 inline constexpr int kAttributeVendor = 1;

@@ -17,6 +17,12 @@ std::optional<float> registryFloat(const sns_registry_data& group, std::string_v
   return item->flt();
 }
 
+std::optional<double> registryNumber(const sns_registry_data& group, std::string_view name) {
+  const Item* const item = findRegistryItem(group, name);
+  if (item != nullptr && item->data_case() == Item::kSint) return static_cast<double>(item->sint());
+  return registryFloat(group, name);
+}
+
 std::vector<float> registryFloats(const sns_registry_data& group, std::string_view name) {
   const Item* const subgroup = findRegistryItem(group, name);
   if (subgroup == nullptr || subgroup->data_case() != Item::kSubgrp) return {};

@@ -14,6 +14,8 @@ namespace simhub {
                                                              std::string_view name);
 /// A float item.
 [[nodiscard]] std::optional<float> registryFloat(const sns_registry_data& group, std::string_view name);
+/// A float or an integer item.
+[[nodiscard]] std::optional<double> registryNumber(const sns_registry_data& group, std::string_view name);
 /// The floats of a subgroup in their order: a vector's components, a matrix's elements in row order. Empty
 /// when there is no such subgroup.
 [[nodiscard]] std::vector<float> registryFloats(const sns_registry_data& group, std::string_view name);

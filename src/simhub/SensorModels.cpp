@@ -1,11 +1,13 @@
 #include "simhub/SensorModels.h"
 
+#include "simhub/Te2Table.h"
 #include "simhub/sensors/AmbientLight.h"
 #include "simhub/sensors/Barometer.h"
 #include "simhub/sensors/ImuSensors.h"
 #include "simhub/sensors/Magnetometer.h"
 #include "simhub/sensors/Proximity.h"
 #include "simhub/sensors/Thermometer.h"
+#include "simhub/sensors/UnderDisplayAmbientLight.h"
 
 namespace simhub {
 namespace {
@@ -37,9 +39,34 @@ constexpr SensorParameter kImuParameters[] = {
     {"outlier_size", 1, 1, -1e6, 1e6, 5, "What an outlier's first value has too much, in the sensor's unit."},
 };
 
+constexpr SensorParameter kUnderDisplayAmbientLightParameters[] = {
+    {"sensitivity", 1, 1, 0, 1000, 1, "Lux that it makes of one lux outside without a calibration."},
+    {"infrared_leak", 1, 1, 0, 10, 0.3, "Share of the infrared that C, R, G and B see as well."},
+    {"integration_time", 1, 1, 2.78, 182000, 1000, "Its own integration time, in µs."},
+    {"full_scale", 1, 1, 1, 1e9, 65535, "Counts at which a channel is saturated."},
+    {"gain_error_c", 3, 3, -0.9, 10, 0, "Share by which C is amplified too much at gain 8, 9 and 10."},
+    {"gain_error_r", 3, 3, -0.9, 10, 0, "The same of R."},
+    {"gain_error_g", 3, 3, -0.9, 10, 0, "The same of G."},
+    {"gain_error_b", 3, 3, -0.9, 10, 0, "The same of B."},
+    {"gain_error_ir", 3, 3, -0.9, 10, 0, "The same of IR."},
+    {"display_leak", 4, 4, 0, 1e6, 2,
+     "Counts that C, R, G, B catch of white per level, at the worst moment."},
+    {"leak_floor", 1, 1, 0, 1, 0.25, "Share of that at the best moment of the refresh."},
+    {"best_delay", 1, 1, 0, 1000, 6, "That moment, in ms after the trigger by the display's own TE2 edge."},
+    {"te2_falling_edge", 1, 1, 0, kMaxTe2Delay, 1180, "That edge, in display lines, where no table is set."},
+    {"te2_line", 1, 1, 0, 1000, 5, "Length of a display line, in µs."},
+    {"pwm_boundary", 1, 1, 0, 255, 60, "Brightness level below which the display is dimmed by pulses."},
+    {"pwm_ripple", 1, 1, 0, 1e6, 300, "Counts that these add to C, R, G and B at the lowest brightness."},
+};
+
 constexpr SensorModel kModels[] = {
     {"ambient_light", "_0_platform.als.fac_cal", kAmbientLightParameters, make<AmbientLight>,
      "One value, the illuminance in lux. Calibration: multiplied by \"scale\" / 1000."},
+    {"under_display_ambient_light", "_0_platform.als.fac_cal", kUnderDisplayAmbientLightParameters,
+     make<UnderDisplayAmbientLight>,
+     "Eight values: lux, the counts of C, R, G, B and IR, the gain setting and the integration time in µs. "
+     "Calibration, of lux alone: \"scale\", gain ratios, coefficients, \"pwm_boundary\" and pattern lines; "
+     "\"delay\" of the trigger."},
     {"barometer",
      "_0_platform.pressure.fac_cal",
      {},

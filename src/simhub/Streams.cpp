@@ -11,7 +11,6 @@ namespace {
 constexpr double kMinRate = 1e-4;
 /// How often an on-change sensor looks, where its rates do not say.
 constexpr double kDefaultRate = 10;
-constexpr const char* kUndecodable = "\xff\xff\xff\xff";  // a tag that never ends
 
 Time periodOf(double rate) { return Time{std::llround(1e9 / rate)}; }
 
@@ -146,7 +145,7 @@ void Streams::encodeReading(std::uint32_t sensor, Time taken, const ReadingFault
       values_,
       isSettled ? SNS_STD_SENSOR_SAMPLE_STATUS_ACCURACY_HIGH : SNS_STD_SENSOR_SAMPLE_STATUS_ACCURACY_LOW,
       event_.mutable_payload());
-  if (faults.malformed) event_.set_payload(kUndecodable);
+  if (faults.malformed) event_.set_payload(kUndecodablePayload);
   event_.set_msg_id(faults.messageId.value_or(source.EventId()));
   event_.set_timestamp(outbox_.Ticks(taken));
 }

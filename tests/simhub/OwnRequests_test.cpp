@@ -69,6 +69,15 @@ TEST(OwnRequests, StaySilentOnDemandButTakeEffect) {
   EXPECT_EQ(lastReading(hub, suid), 1);
 }
 
+TEST(OwnRequests, AreAnsweredOnDemandByWhatCannotBeDecodedButTakeEffect) {
+  HubHarness hub = echoHub({"fault.f.kind=oem_malformed", "fault.f.message=7000"});
+  const simhub::Suid suid = hub.Find("pressure");
+  const auto answer = hub.Ask(suid, kEchoRequest, "hello");
+  ASSERT_TRUE(answer && answer->messageId == kEchoEvent);
+  EXPECT_FALSE(sns_std_sensor_event().ParseFromString(answer->payload));
+  EXPECT_EQ(lastReading(hub, suid), 1);
+}
+
 TEST(OwnRequests, WhatTheyChangedIsForgottenWhenTheHubComesBack) {
   HubHarness hub = echoHub({"fault.f.kind=hub_away", "fault.f.from=20", "fault.f.down_for=1"});
   const simhub::Suid suid = hub.Find("pressure");
