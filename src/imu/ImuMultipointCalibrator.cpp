@@ -1,15 +1,13 @@
 #include "imu/ImuMultipointCalibrator.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <set>
-
-#include <unistd.h>
 
 #include "framework/Statistics.h"
 #include "imu/ImuMultipointSamples.h"
 #include "ssc/DevicePath.h"
 #include "ssc/Log.h"
+#include "ssc/WorkingFile.h"
 
 namespace {
 
@@ -40,7 +38,7 @@ void ClearIntermediateFiles() {
   ssc::log(ssc::kLogInfo, "Clearing existing intermediate IMU calibration data.");
   for (const char* file : files) {
     ssc::log(ssc::kLogDebug, "Removing file: %s", file);
-    if (::unlink(ssc::devicePath(file).c_str()) == 0 || errno == ENOENT) continue;
+    if (ssc::removeWorkingFile(ssc::devicePath(file)) == 0) continue;
     // Records of an earlier calibration would be taken for this one's.
     ssc::log(ssc::kLogWarn, "Unable to remove file: %s", file);
   }

@@ -6,9 +6,10 @@
 #include <cstring>
 #include <sstream>
 
-#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
+
+#include "ssc/WorkingFile.h"
 
 namespace {
 
@@ -18,20 +19,13 @@ constexpr int kDigits = 16;
 
 class File {
  public:
-  // Not blocking: a pipe that stands where the file should be is no reason to hang.
-  File(const std::string& path, int flags)
-      : descriptor_(::open(path.c_str(), flags | O_CLOEXEC | O_NONBLOCK, 0644)) {}
-  File(const File&) = delete;
-  File& operator=(const File&) = delete;
-  ~File() {
-    if (isOpen()) ::close(descriptor_);
-  }
+  File(const std::string& path, ssc::WorkingFileUse use) : file_(ssc::openWorkingFile(path, use)) {}
 
-  [[nodiscard]] bool isOpen() const { return descriptor_ >= 0; }
+  [[nodiscard]] bool isOpen() const { return file_.valid(); }
 
   [[nodiscard]] off_t size() const {
     struct stat information {};
-    return ::fstat(descriptor_, &information) == 0 ? information.st_size : 0;
+    return ::fstat(file_.get(), &information) == 0 ? information.st_size : 0;
   }
 
   /// Everything or nothing, and on the disk when it returns.
@@ -39,20 +33,20 @@ class File {
     const off_t before = size();
     std::size_t written = 0;
     while (written < bytes.size()) {
-      const ssize_t count = ::write(descriptor_, bytes.data() + written, bytes.size() - written);
+      const ssize_t count = ::write(file_.get(), bytes.data() + written, bytes.size() - written);
       if (count < 0 && errno == EINTR) continue;
       if (count <= 0) break;
       written += static_cast<std::size_t>(count);
     }
     // EINVAL: something that has no disk behind it.
-    if (written == bytes.size() && (::fsync(descriptor_) == 0 || errno == EINVAL)) return true;
+    if (written == bytes.size() && (::fsync(file_.get()) == 0 || errno == EINVAL)) return true;
     truncate(before);
     return false;
   }
 
   void truncate(off_t size) {
     // Nothing can be done about a failure, and the caller reports the write that led here.
-    if (::ftruncate(descriptor_, size) != 0) errno = 0;
+    if (::ftruncate(file_.get(), size) != 0) errno = 0;
   }
 
   /// The file's whole content, up to kMaxImuFileBytes.
@@ -60,7 +54,7 @@ class File {
     content->clear();
     std::array<char, 4096> piece;
     for (;;) {
-      const ssize_t count = ::read(descriptor_, piece.data(), piece.size());
+      const ssize_t count = ::read(file_.get(), piece.data(), piece.size());
       if (count < 0 && errno == EINTR) continue;
       if (count < 0) return FileResult::kFailed;
       if (count == 0) return FileResult::kOk;
@@ -70,11 +64,11 @@ class File {
   }
 
  private:
-  int descriptor_;
+  ssc::Descriptor file_;
 };
 
 FileResult readFile(const std::string& path, std::string* content) {
-  File file(path, O_RDONLY);
+  File file(path, ssc::WorkingFileUse::kRead);
   return file.isOpen() ? file.read(content) : FileResult::kCannotOpen;
 }
 
@@ -132,7 +126,7 @@ bool ImuCalibrationInfo::IsFinite() const {
 }
 
 FileResult appendCalibrationInfo(const ImuCalibrationInfo& info, const std::string& path, bool* dropped) {
-  File file(path, O_WRONLY | O_APPEND | O_CREAT);
+  File file(path, ssc::WorkingFileUse::kAppend);
   if (!file.isOpen()) return FileResult::kCannotOpen;
   const bool hasDropped = dropUnfinishedLine(path, file);
   if (dropped != nullptr) *dropped = hasDropped;
@@ -155,7 +149,8 @@ FileResult readCalibrationInfos(const std::string& path, std::vector<ImuCalibrat
 }
 
 FileResult appendPosition(const ImuPosition& position, const std::string& path, FileStart start) {
-  File file(path, O_WRONLY | O_APPEND | O_CREAT | (start == FileStart::kTruncate ? O_TRUNC : 0));
+  File file(path,
+            start == FileStart::kTruncate ? ssc::WorkingFileUse::kReplace : ssc::WorkingFileUse::kAppend);
   if (!file.isOpen()) return FileResult::kCannotOpen;
   std::string record;
   for (const SampleData* block : {&position.accel, &position.gyro, &position.temp}) {

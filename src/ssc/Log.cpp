@@ -12,18 +12,16 @@
 #include <string_view>
 #include <vector>
 
-#include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include "ssc/DevicePath.h"
+#include "ssc/WorkingFile.h"
 
 namespace ssc {
 namespace {
 
 constexpr std::array<const char*, 5> kLevelWords{"ERROR", "WARN", "INFO", "DEBUG", "VERBOSE"};
 constexpr const char* kSayWord = "SAY";
-constexpr mode_t kLogFileMode = 0644;
 constexpr const char* kEraseLine = "\r\x1b[K";  // to the line's start, and clear to its end
 
 /// The log file. Lines come in pieces; each whole line gets its time stamp when its newline arrives, or when
@@ -32,16 +30,11 @@ class LogFile {
  public:
   int open(const std::string& path) {
     close();
-    // O_NONBLOCK: a pipe that nobody reads is refused instead of waited for.
-    constexpr int kFlags = O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK;
-    const int fd = ::open(path.c_str(), kFlags, kLogFileMode);
-    if (fd < 0) return -errno;
-    file_ = ::fdopen(fd, "a");
-    if (file_ == nullptr) {
-      const int error = errno;
-      ::close(fd);
-      return -error;
-    }
+    Descriptor file = openWorkingFile(path, WorkingFileUse::kAppend);
+    if (!file.valid()) return -errno;
+    file_ = ::fdopen(file.get(), "a");
+    if (file_ == nullptr) return -errno;
+    (void)file.release();
     std::setvbuf(file_, nullptr, _IOLBF, BUFSIZ);
     return 0;
   }

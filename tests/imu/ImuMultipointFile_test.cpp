@@ -142,6 +142,17 @@ TEST_F(ImuFileTest, AFolderInThePlaceOfTheFileIsAFault) {
   EXPECT_EQ(appendCalibrationInfo(info("a+x"), path), FileResult::kCannotOpen);
 }
 
+TEST_F(ImuFileTest, ALinkInThePlaceOfTheFileIsNeitherReadNorWritten) {
+  const std::string victim = folder.path() / "victim";
+  ASSERT_TRUE(support::writeFile(victim, "precious\n"));
+  std::filesystem::create_symlink(victim, path);
+  std::vector<ImuCalibrationInfo> records;
+  EXPECT_EQ(readCalibrationInfos(path, &records), FileResult::kCannotOpen);
+  EXPECT_EQ(appendCalibrationInfo(info("a+x"), path), FileResult::kCannotOpen);
+  EXPECT_EQ(appendPosition({}, path, FileStart::kTruncate), FileResult::kCannotOpen);
+  EXPECT_EQ(support::readFile(victim), "precious\n");
+}
+
 TEST_F(ImuFileTest, AFullDiskIsReported) {
   if (!std::filesystem::exists("/dev/full")) GTEST_SKIP() << "no /dev/full here";
   EXPECT_EQ(appendCalibrationInfo(info("a+x"), "/dev/full"), FileResult::kFailed);
