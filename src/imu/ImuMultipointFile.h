@@ -1,7 +1,4 @@
 // The file that carries a multi-point calibration from one step to the next, in either of its two formats.
-//
-// A record is written in one piece and synced, so that a step that reported success is kept whatever happens,
-// and a step that dies loses its own record at most. What does not fit on the disk is taken back.
 #pragma once
 
 #include <array>
@@ -10,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "framework/DataFile.h"
 #include "framework/SampleData.h"
 
 /// The step's result of one phase: one line of the file.
@@ -42,14 +40,6 @@ struct ImuPosition {
 /// Where it lies on the handset, whichever the procedure: no device serves both.
 inline constexpr const char* kImuDataFile = "/data/app-ephemeral/vantle_imu";
 
-enum class FileResult {
-  kOk,
-  kCannotOpen,
-  kFailed,      ///< a short write, or a read error
-  kIncomplete,  ///< ends within a record
-  kTooLarge,    ///< more than kMaxImuFileBytes: no calibration comes near
-};
-
 /// A calibration has some 15 records of about 200 bytes.
 inline constexpr std::size_t kMaxImuFileBytes = 1024 * 1024;
 
@@ -62,7 +52,6 @@ inline constexpr std::size_t kMaxImuFileBytes = 1024 * 1024;
 [[nodiscard]] FileResult readCalibrationInfos(const std::string& path,
                                               std::vector<ImuCalibrationInfo>* infos);
 
-enum class FileStart { kKeep, kTruncate };
 /// Appends 28 bytes: seven floats in the machine's byte order. Unlike a line, a torn record is left for the
 /// reader to report: nothing in the bytes tells where a record begins.
 [[nodiscard]] FileResult appendPosition(const ImuPosition& position, const std::string& path,
