@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "framework/LowerCase.h"
 #include "ssc/AttrUtil.h"
 #include "ssc/Log.h"
 #include "ssc/SuidUtil.h"
@@ -39,13 +40,6 @@ const ssc::SensorUid* findInPackage(ssc::AttrUtil& attributeUtil, const std::vec
     if (isOfType && itsPackage == package) return &suid;
   }
   return nullptr;
-}
-
-std::string toLowerAscii(std::string text) {
-  for (char& c : text) {
-    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
-  }
-  return text;
 }
 
 }  // namespace

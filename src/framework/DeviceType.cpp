@@ -7,6 +7,7 @@
 #include <unordered_set>
 
 #include "framework/Calibrator.h"
+#include "framework/LowerCase.h"
 
 namespace {
 
@@ -16,8 +17,6 @@ struct Family {
   Codenames codenames;
   DeviceType type;
 };
-
-char toLowerAscii(char c) { return (c >= 'A' && c <= 'Z') ? static_cast<char>(c - 'A' + 'a') : c; }
 
 }  // namespace
 
@@ -32,8 +31,7 @@ DeviceType Calibrator::Arguments::DeviceNameToDeviceType(const std::string& name
       {{"g3", "rufael"}, DeviceType::rufael},
       {{"w9", "whiskel"}, DeviceType::whiskel},
   }};
-  std::string lowered = name;
-  std::transform(lowered.begin(), lowered.end(), lowered.begin(), toLowerAscii);
+  const std::string lowered = toLowerAscii(name);
   const auto family = std::find_if(families.begin(), families.end(),
                                    [&](const Family& each) { return each.codenames.contains(lowered); });
   return family == families.end() ? DeviceType::invalid : family->type;
