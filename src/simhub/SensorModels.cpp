@@ -5,6 +5,7 @@
 #include "simhub/sensors/ImuSensors.h"
 #include "simhub/sensors/Magnetometer.h"
 #include "simhub/sensors/Proximity.h"
+#include "simhub/sensors/Sar.h"
 #include "simhub/sensors/Thermometer.h"
 
 namespace simhub {
@@ -61,6 +62,12 @@ constexpr SensorModel kModels[] = {
      "\"corr_mat\", \"bias\" and the thermal scale."},
     {"gyroscope", "_0_platform.gyro.fac_cal", kImuParameters, make<Gyroscope>,
      "Three values, rad/s by axis. Calibration: \"corr_mat\", \"bias\" and the thermal scale."},
+    {"sar",
+     "",
+     {},
+     make<Sar>,
+     "Two values, counts of the top and the bottom electrode beyond what was compensated. Calibration: "
+     "\"max_offset_top\" and \"max_offset_bottom\" are the most that it compensates."},
     {"temperature", "", {}, make<Thermometer>, "One value, the chip's temperature in °C."},
 };
 
