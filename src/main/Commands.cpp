@@ -11,6 +11,7 @@
 #include "mag/MagOrientation.h"
 #include "mag/MagSoftIron.h"
 #include "prox/ProxCalibrator.h"
+#include "prox/SarCalibrator.h"
 
 namespace {
 
@@ -46,6 +47,7 @@ constexpr Command kCommands[] = {
     {"mag-sensitivity", anyDevice, make<MagCurrentSensitivity>},
     {"mag-softiron", anyDevice, make<MagSoftIron>},
     {"prox", hasProximityThresholds, make<ProxCalibrator>},
+    {"sar", anyDevice, make<SarCalibrator>},
 };
 
 }  // namespace
