@@ -244,7 +244,7 @@ int AlsCalibrator::measureAndCompare() {
   float mean = 0;
   const int result = measure(correctionFactor, &mean);
   if (result != ssc::kOk) return result;
-  const float difference = luxDifferencePercent(mean, referenceLux);
+  const float difference = differencePercent(mean, referenceLux);
   ssc::say("DIFF:  %14.6f%%\n", static_cast<double>(difference));
   if (isWithinTolerance(difference, verifyPercent)) return ssc::kOk;
   ssc::say("Difference exceeds |%.3f%%| tolerance.\n", static_cast<double>(verifyPercent));
