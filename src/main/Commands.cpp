@@ -5,6 +5,7 @@
 #include "imu/ImuMultipointCalibrator.h"
 #include "imu/ImuThermalCalibrator.h"
 #include "light/AlsCalibrator.h"
+#include "light/ColorCalibrator.h"
 #include "mag/BaroCalibrator.h"
 #include "mag/MagCalibrator.h"
 #include "mag/MagCurrentSensitivity.h"
@@ -40,6 +41,7 @@ struct Command {
 constexpr Command kCommands[] = {
     {"als", hasClassicAmbientLight, make<AlsCalibrator>},
     {"baro", anyDevice, make<BaroCalibrator>},
+    {"color", anyDevice, make<ColorCalibrator>},
     {"imu-multipoint", anyDevice, make<ImuMultipointCalibrator>},
     {"imu-thermal", anyDevice, make<ImuThermalCalibrator>},
     {"mag", anyDevice, make<MagCalibrator>},
