@@ -16,12 +16,11 @@ float besselDivisor(const std::vector<Sample>& samples) {
   return static_cast<float>(static_cast<std::uint64_t>(samples.size()) - 1U);
 }
 
-/// 0/0 is a negative not-a-number on x86 and a positive one on the handset: printed, they would differ.
+}  // namespace
+
 float withPlainNan(float value) {
   return std::isnan(value) ? std::numeric_limits<float>::quiet_NaN() : value;
 }
-
-}  // namespace
 
 float sampleFloatMean(const std::vector<Sample>& samples) {
   float sum = 0;

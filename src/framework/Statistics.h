@@ -18,3 +18,7 @@
 
 /// The same for each element.
 [[nodiscard]] SampleData sampleStdev(const std::vector<Sample>& samples, const SampleData& mean);
+
+/// The value, or the positive not-a-number for any. 0/0 is a negative one on x86 and a positive one on the
+/// handset: printed, they would differ.
+[[nodiscard]] float withPlainNan(float value);

@@ -109,7 +109,7 @@ int AmbientLightCommand::ReportMeasurement(const LuxMeasurement& measurement) co
 }
 
 int AmbientLightCommand::CompareWithReference(float mean, float referenceLux) const {
-  const float difference = luxDifferencePercent(mean, referenceLux);
+  const float difference = differencePercent(mean, referenceLux);
   ssc::say("DIFF:  %14.6f%%\n", static_cast<double>(difference));
   if (isWithinTolerance(difference, verifyPercent)) return ssc::kOk;
   ssc::say("Difference exceeds |%.3f%%| tolerance.\n", static_cast<double>(verifyPercent));

@@ -1,7 +1,6 @@
 #include "light/LuxScale.h"
 
 #include <cmath>
-#include <limits>
 
 #include "framework/Statistics.h"
 
@@ -22,12 +21,10 @@ float luxScale(float previousScale, float referenceLux, float meanLux) {
   return previousScale * referenceLux / meanLux;
 }
 
-float luxDifferencePercent(float meanLux, float referenceLux) {
-  const float difference = (meanLux - referenceLux) * 100.0F / referenceLux;
-  // 0/0 is a negative not-a-number on x86 and a positive one on the handset: printed, they would differ.
-  return std::isnan(difference) ? std::numeric_limits<float>::quiet_NaN() : difference;
+float differencePercent(float mean, float reference) {
+  return withPlainNan((mean - reference) * 100.0F / reference);
 }
 
-bool isWithinTolerance(float differencePercent, float tolerancePercent) {
-  return !(std::fabs(differencePercent) > tolerancePercent);
+bool isWithinTolerance(float percent, float tolerancePercent) {
+  return !(std::fabs(percent) > tolerancePercent);
 }

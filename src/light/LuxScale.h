@@ -26,9 +26,9 @@ void correctLux(float factor, std::vector<Sample>* samples);
 [[nodiscard]] float luxScale(float previousScale, float referenceLux, float meanLux);
 
 /// How far the mean lies above the reference, in percent of the reference. Infinite, or not a number, for a
-/// reference of 0.
-[[nodiscard]] float luxDifferencePercent(float meanLux, float referenceLux);
+/// reference of 0. Of whatever quantity.
+[[nodiscard]] float differencePercent(float mean, float reference);
 
 /// A difference that equals the tolerance is within it, and so is one that is not a number (no light under a
 /// reference of 0).
-[[nodiscard]] bool isWithinTolerance(float differencePercent, float tolerancePercent);
+[[nodiscard]] bool isWithinTolerance(float percent, float tolerancePercent);

@@ -5,12 +5,14 @@
 #include "imu/ImuMultipointCalibrator.h"
 #include "imu/ImuThermalCalibrator.h"
 #include "light/AlsCalibrator.h"
+#include "light/ColorCalibrator.h"
 #include "mag/BaroCalibrator.h"
 #include "mag/MagCalibrator.h"
 #include "mag/MagCurrentSensitivity.h"
 #include "mag/MagOrientation.h"
 #include "mag/MagSoftIron.h"
 #include "prox/ProxCalibrator.h"
+#include "prox/SarCalibrator.h"
 
 namespace {
 
@@ -39,6 +41,7 @@ struct Command {
 constexpr Command kCommands[] = {
     {"als", hasClassicAmbientLight, make<AlsCalibrator>},
     {"baro", anyDevice, make<BaroCalibrator>},
+    {"color", anyDevice, make<ColorCalibrator>},
     {"imu-multipoint", anyDevice, make<ImuMultipointCalibrator>},
     {"imu-thermal", anyDevice, make<ImuThermalCalibrator>},
     {"mag", anyDevice, make<MagCalibrator>},
@@ -46,6 +49,7 @@ constexpr Command kCommands[] = {
     {"mag-sensitivity", anyDevice, make<MagCurrentSensitivity>},
     {"mag-softiron", anyDevice, make<MagSoftIron>},
     {"prox", hasProximityThresholds, make<ProxCalibrator>},
+    {"sar", anyDevice, make<SarCalibrator>},
 };
 
 }  // namespace

@@ -3,9 +3,11 @@
 #include "simhub/Te2Table.h"
 #include "simhub/sensors/AmbientLight.h"
 #include "simhub/sensors/Barometer.h"
+#include "simhub/sensors/Color.h"
 #include "simhub/sensors/ImuSensors.h"
 #include "simhub/sensors/Magnetometer.h"
 #include "simhub/sensors/Proximity.h"
+#include "simhub/sensors/Sar.h"
 #include "simhub/sensors/Thermometer.h"
 #include "simhub/sensors/UnderDisplayAmbientLight.h"
 
@@ -23,6 +25,11 @@ constexpr SensorParameter kAmbientLightParameters[] = {
     {"infrared_leak", 1, 1, 0, 10, 0, "Share by which light of nothing but infrared is seen brighter."},
     {"corrects", 1, 1, 0, 1, 0,
      "1: the calibrated stream is also multiplied by the registry's \"corr_factor\"."},
+};
+
+constexpr SensorParameter kColorParameters[] = {
+    {"infrared_crosstalk", 1, 1, 0, 1, 0.08,
+     "Share of the infrared counts that the red, green and blue filters let through."},
 };
 
 constexpr SensorParameter kProximityParameters[] = {
@@ -88,6 +95,18 @@ constexpr SensorModel kModels[] = {
      "\"corr_mat\", \"bias\" and the thermal scale."},
     {"gyroscope", "_0_platform.gyro.fac_cal", kImuParameters, make<Gyroscope>,
      "Three values, rad/s by axis. Calibration: \"corr_mat\", \"bias\" and the thermal scale."},
+    {"color", "_platform.color.fac_cal", kColorParameters, make<Color>,
+     "Seven values: color temperature in K, counts of clear, red, green, blue and infrared, gain step. "
+     "Calibration: the line \"ratio_coef0\" + \"ratio_coef1\" · blue / red gives the color temperature."},
+    {"color_light", "_platform.als.fac_cal", kColorParameters, make<ColorLight>,
+     "Seven values, those of `color` but for the first, which is the illuminance in lux. Calibration: "
+     "multiplied by \"scale\"."},
+    {"sar",
+     "",
+     {},
+     make<Sar>,
+     "Two values, counts of the top and the bottom electrode beyond what was compensated. Calibration: "
+     "\"max_offset_top\" and \"max_offset_bottom\" are the most that it compensates."},
     {"temperature", "", {}, make<Thermometer>, "One value, the chip's temperature in °C."},
 };
 

@@ -20,6 +20,7 @@ enum class WorldSignal : std::size_t {
   kIlluminance,
   kColorTemperature,
   kIrShare,
+  kInfrared,
   kMagneticField,
   kPose,
   kRotationRate,

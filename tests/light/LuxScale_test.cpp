@@ -65,24 +65,24 @@ TEST(LuxScale, MultiplicationMayOverflowAndShows) {
 TEST(LuxScale, DarkReferenceGivesScaleZero) { EXPECT_EQ(luxScale(1000.0F, 0.0F, 5.0F), 0.0F); }
 
 TEST(LuxScale, DifferenceIsInPercentOfTheReference) {
-  EXPECT_EQ(luxDifferencePercent(330.0F, 300.0F), 10.0F);
-  EXPECT_EQ(luxDifferencePercent(150.0F, 300.0F), -50.0F);
+  EXPECT_EQ(differencePercent(330.0F, 300.0F), 10.0F);
+  EXPECT_EQ(differencePercent(150.0F, 300.0F), -50.0F);
 }
 
 TEST(LuxScale, DifferenceAtExactlyTheToleranceIsWithinIt) {
-  EXPECT_TRUE(isWithinTolerance(luxDifferencePercent(330.0F, 300.0F), 10.0F));
-  EXPECT_TRUE(isWithinTolerance(luxDifferencePercent(270.0F, 300.0F), 10.0F));
+  EXPECT_TRUE(isWithinTolerance(differencePercent(330.0F, 300.0F), 10.0F));
+  EXPECT_TRUE(isWithinTolerance(differencePercent(270.0F, 300.0F), 10.0F));
   EXPECT_FALSE(isWithinTolerance(std::nextafter(10.0F, 11.0F), 10.0F));
   EXPECT_FALSE(isWithinTolerance(std::nextafter(-10.0F, -11.0F), 10.0F));
 }
 
 TEST(LuxScale, LightUnderADarkReferenceIsOutOfTolerance) {
-  EXPECT_EQ(luxDifferencePercent(5.0F, 0.0F), kInfinity);
-  EXPECT_FALSE(isWithinTolerance(luxDifferencePercent(5.0F, 0.0F), 100.0F));
+  EXPECT_EQ(differencePercent(5.0F, 0.0F), kInfinity);
+  EXPECT_FALSE(isWithinTolerance(differencePercent(5.0F, 0.0F), 100.0F));
 }
 
 TEST(LuxScale, DarknessUnderADarkReferenceIsWithinTolerance) {
-  EXPECT_TRUE(std::isnan(luxDifferencePercent(0.0F, 0.0F)));
+  EXPECT_TRUE(std::isnan(differencePercent(0.0F, 0.0F)));
   EXPECT_TRUE(isWithinTolerance(kNan, 1.0F));
 }
 
