@@ -23,6 +23,12 @@ std::optional<double> registryNumber(const sns_registry_data& group, std::string
   return registryFloat(group, name);
 }
 
+std::optional<std::int64_t> registryInteger(const sns_registry_data& group, std::string_view name) {
+  const Item* const item = findRegistryItem(group, name);
+  if (item == nullptr || item->data_case() != Item::kSint) return std::nullopt;
+  return item->sint();
+}
+
 std::vector<float> registryFloats(const sns_registry_data& group, std::string_view name) {
   const Item* const subgroup = findRegistryItem(group, name);
   if (subgroup == nullptr || subgroup->data_case() != Item::kSubgrp) return {};

@@ -7,6 +7,7 @@
 #include "simhub/sensors/ImuSensors.h"
 #include "simhub/sensors/Magnetometer.h"
 #include "simhub/sensors/Proximity.h"
+#include "simhub/sensors/ProximityOffset.h"
 #include "simhub/sensors/Sar.h"
 #include "simhub/sensors/Thermometer.h"
 #include "simhub/sensors/UnderDisplayAmbientLight.h"
@@ -32,9 +33,22 @@ constexpr SensorParameter kColorParameters[] = {
      "Share of the infrared counts that the red, green and blue filters let through."},
 };
 
-constexpr SensorParameter kProximityParameters[] = {
-    {"reference_distance", 1, 1, 1, 10000, 50, "Distance of a target, in mm, at which it throws back"},
-    {"reference_counts", 1, 1, 0, 65535, 140, "this much light, in counts."},
+constexpr SensorParameter kReferenceDistance{
+    "reference_distance", 1, 1, 1, 10000, 50, "Distance of a target, in mm, at which it throws back"};
+constexpr SensorParameter kReferenceCounts{"reference_counts",           1, 1, 0, 65535, 140,
+                                           "this much light, in counts."};
+
+constexpr SensorParameter kProximityParameters[] = {kReferenceDistance, kReferenceCounts};
+
+constexpr SensorParameter kProximityOffsetParameters[] = {
+    kReferenceDistance,
+    kReferenceCounts,
+    {"reference_ppulse", 1, 1, 0, 63, 31, "The registry's \"ppulse\" for which this holds,"},
+    {"reference_pldrive", 1, 1, 1, 31, 18, "and its \"pldrive\"."},
+    {"offset_range", 1, 1, 0, 65535, 255, "The most that the offset takes off without extension, in counts."},
+    {"extension_step", 1, 1, 0, 65535, 64,
+     "What one step of the extension takes off, in counts, until a request says otherwise."},
+    {"automatic", 1, 1, 0, 1, 1, "1: calibrates its offset by itself until a request says otherwise."},
 };
 
 constexpr SensorParameter kImuParameters[] = {
@@ -83,6 +97,11 @@ constexpr SensorModel kModels[] = {
      "Proximity events of raw counts, 0 to 255, and the reading before it is cut to counts. Calibration: "
      "near from "
      "\"near_threshold\" on, far from \"far_threshold\" down."},
+    {"proximity_offset", "_0_platform.prox.fac_cal", kProximityOffsetParameters, make<ProximityOffsetSensor>,
+     "Proximity events of raw counts, 0 to 65535, the offset taken off them, and the steps of its extension. "
+     "Calibration: \"poffset\" and \"ore\" are taken off, what is left is in proportion to \"ppulse\" + 1 "
+     "and "
+     "\"pldrive\"."},
     {"magnetometer",
      "_0_platform.mag.fac_cal",
      {},
