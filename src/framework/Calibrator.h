@@ -123,6 +123,8 @@ class Calibrator : public ssc::Client {
   void PrintSamples();
   /// 0 when the sensor has samples, else ssc::kNoData after a level-0 message that names it.
   [[nodiscard]] int RequireSamples(const ssc::SensorUid& suid);
+  /// The same for a command that counts its samples instead of keeping them.
+  [[nodiscard]] int RequireSamples(const ssc::SensorUid& suid, std::size_t count) const;
   /// 0 when all values are finite, else ssc::kInvalid after a level-0 message with `what`.
   [[nodiscard]] static int RequireFinite(const char* what, const std::vector<float>& values);
 

@@ -104,7 +104,11 @@ int Calibrator::RequireCollected(int result) {
 
 int Calibrator::RequireSamples(const ssc::SensorUid& suid) {
   const auto found = samples.find(suid);
-  if (found != samples.end() && !found->second.empty()) return ssc::kOk;
+  return RequireSamples(suid, found == samples.end() ? 0 : found->second.size());
+}
+
+int Calibrator::RequireSamples(const ssc::SensorUid& suid, std::size_t count) const {
+  if (count > 0) return ssc::kOk;
   const auto info = sensorInfo.find(suid);
   ssc::log(ssc::kLogError, "No %s samples were received",
            info == sensorInfo.end() ? "sensor" : info->second.name.c_str());
