@@ -12,18 +12,23 @@
 #include "mag/MagOrientation.h"
 #include "mag/MagSoftIron.h"
 #include "prox/ProxCalibrator.h"
+#include "prox/ProxPoffset.h"
 #include "prox/SarCalibrator.h"
 
 namespace {
 
 bool anyDevice(DeviceType) { return true; }
 
-/// The light sensor looks past the display, not through it.
-bool hasClassicAmbientLight(DeviceType type) {
-  return type != DeviceType::t5h5 && type != DeviceType::rufael && type != DeviceType::whiskel;
+/// Light and proximity sensor look through the display, not past it.
+bool looksThroughDisplay(DeviceType type) {
+  return type == DeviceType::t5h5 || type == DeviceType::rufael || type == DeviceType::whiskel;
 }
 
+bool hasClassicAmbientLight(DeviceType type) { return !looksThroughDisplay(type); }
+
 bool hasProximityThresholds(DeviceType type) { return type == DeviceType::o1v1; }
+
+bool hasProximityOffset(DeviceType type) { return type == DeviceType::p2m2 || type == DeviceType::e4d4; }
 
 template <class Command>
 std::unique_ptr<Calibrator> make(ssc::Connection* connection) {
@@ -49,6 +54,7 @@ constexpr Command kCommands[] = {
     {"mag-sensitivity", anyDevice, make<MagCurrentSensitivity>},
     {"mag-softiron", anyDevice, make<MagSoftIron>},
     {"prox", hasProximityThresholds, make<ProxCalibrator>},
+    {"prox", hasProximityOffset, make<ProxPoffset>},
     {"sar", anyDevice, make<SarCalibrator>},
 };
 
