@@ -14,6 +14,7 @@
 #include "prox/ProxCalibrator.h"
 #include "prox/ProxPoffset.h"
 #include "prox/SarCalibrator.h"
+#include "prox/UdProxCalibrator.h"
 
 namespace {
 
@@ -55,6 +56,7 @@ constexpr Command kCommands[] = {
     {"mag-softiron", anyDevice, make<MagSoftIron>},
     {"prox", hasProximityThresholds, make<ProxCalibrator>},
     {"prox", hasProximityOffset, make<ProxPoffset>},
+    {"prox", looksThroughDisplay, make<UdProxCalibrator>},
     {"sar", anyDevice, make<SarCalibrator>},
 };
 

@@ -61,7 +61,7 @@ int ProxPoffset::ParseArgs(const Arguments& arguments) {
 
 int ProxPoffset::sample() {
   int result = CollectReadings(Printing::kNone);
-  if (result == ssc::kOk) result = RequireSamples(suid_, static_cast<std::size_t>(sums_.count));
+  if (result == ssc::kOk) result = RequireReadings();
   if (result == ssc::kOk) PrintRawAverage();
   return result;
 }

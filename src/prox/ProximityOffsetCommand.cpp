@@ -40,6 +40,10 @@ int ProximityOffsetCommand::RequestSwitch(std::uint32_t messageId, const std::st
   return result;
 }
 
+int ProximityOffsetCommand::RequireReadings() const {
+  return RequireSamples(suid_, static_cast<std::size_t>(sums_.count));
+}
+
 void ProximityOffsetCommand::PrintRawAverage() const {
   ssc::say("\nADC_AVG: %14.6f\n", static_cast<double>(sums_.MeanRaw()));
 }

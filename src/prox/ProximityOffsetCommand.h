@@ -24,6 +24,8 @@ class ProximityOffsetCommand : public ProximityCommand {
   /// count: the sensor streams again when the hub comes back, which has forgotten the request. `failure` is
   /// the level-0 message.
   [[nodiscard]] int RequestSwitch(std::uint32_t messageId, const std::string& payload, const char* failure);
+  /// 0 when a collection brought readings, else ssc::kNoData after a level-0 message.
+  [[nodiscard]] int RequireReadings() const;
   /// What is printed of readings that were collected.
   void PrintRawAverage() const;
 
