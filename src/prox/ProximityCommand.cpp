@@ -65,9 +65,8 @@ int ProximityCommand::LookupSuid() {
 int ProximityCommand::CollectReadings(Printing printing) {
   const int result = CollectSamples(std::chrono::seconds(samplesToCollect_ / source_.rateHz + kExtraSeconds),
                                     printing == Printing::kSamples);
-  if (result == ssc::kTimedOut) {
-    ssc::log(ssc::kLogError, "Timed out waiting for proximity sensor samples");
-  }
+  if (result != ssc::kTimedOut) return RequireCollected(result);
+  ssc::log(ssc::kLogError, "Timed out waiting for proximity sensor samples");
   return result;
 }
 

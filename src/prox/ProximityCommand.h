@@ -38,7 +38,7 @@ class ProximityCommand : public Calibrator {
   enum class Printing { kNone, kSamples };
   /// Streams the sensor until a handler ends it. The time for that is what the samples themselves take, in
   /// whole seconds, and three seconds more: the sensor needs a while to become accurate. Results as of
-  /// CollectSamples; ssc::kTimedOut, after a level-0 message, is a failure here.
+  /// CollectSamples, each failure after a level-0 message; ssc::kTimedOut is a failure here.
   [[nodiscard]] int CollectReadings(Printing printing);
 
   // Events. On the event thread, mutex held.
