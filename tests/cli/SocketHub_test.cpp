@@ -38,12 +38,13 @@ class SocketHub : public testing::Test {
   [[nodiscard]] fs::path socket() const { return folder_.path() / "hub"; }
 
   /// A hub that listens.
-  [[nodiscard]] std::unique_ptr<support::Process> startHub(const std::string& scenario,
-                                                           double speed = 1) const {
+  [[nodiscard]] std::unique_ptr<support::Process> startHub(
+      const std::string& scenario, double speed = 1,
+      const std::vector<std::string>& settings = kStill) const {
     support::Command command{VANTLE_HUB_PROGRAM, "vantle-hub", {}, environment(), "", ""};
     command.arguments = {"--socket", socket().string(), "--scenario",
                          scenario,   "--speed",         std::to_string(speed)};
-    for (const std::string& setting : kStill)
+    for (const std::string& setting : settings)
       command.arguments.insert(command.arguments.end(), {"--set", setting});
     auto hub = std::make_unique<support::Process>();
     EXPECT_TRUE(hub->start(command));
@@ -61,6 +62,15 @@ class SocketHub : public testing::Test {
     support::Command command{VANTLE_PROGRAM, "vantle", words, environment(), "", ""};
     command.environment.emplace_back("VANTLE_HUB", "unix:" + socket().string());
     return command;
+  }
+
+  /// What a "prox" that has to succeed prints.
+  [[nodiscard]] std::string runProx(const std::string& device, const std::vector<std::string>& words) const {
+    std::vector<std::string> all{"-d", device, "-q", "prox"};
+    all.insert(all.end(), words.begin(), words.end());
+    const support::Outcome outcome = support::run(vantle(all), kPatience);
+    EXPECT_TRUE(outcome.exitedWith(0)) << outcome.describe() << outcome.errors;
+    return outcome.output;
   }
 
   [[nodiscard]] std::string registryFile(const std::string& group) const {
@@ -202,6 +212,47 @@ TEST_F(SocketHub, ASecondRunOnTheSameHubShowsTheErrorGone) {
             "Barometer calibration succeeded.\n");
   EXPECT_EQ(registryFile("barochip4_0_platform.pressure.fac_cal.bias"),
             "{\n  \"items\": [\n    {\"name\": \"x\", \"version\": 2, \"float\": 4.25}\n  ]\n}\n");
+}
+
+TEST_F(SocketHub, AProximityOffsetLastsAsLongAsTheHub) {
+  // Without noise, and with a light that rounds the same at every moment.
+  const auto hub = startHub("p2m2", 10, {"sensor.proximity.noise=0"});
+  const auto run = [&](const std::vector<std::string>& words) { return runProx("p2m2", words); };
+  const std::string start = "Searching for proximity sensor...\n";
+  EXPECT_EQ(run({}), start + "Collecting samples...\n\nADC_AVG:      54.000000\n");
+  EXPECT_EQ(run({"poffset"}), start +
+                                  "Disabling POFFSET calibration...\nPOFFSET disabled.\n"
+                                  "Collecting samples...\n\nADC_AVG:       0.000000\n");
+  EXPECT_EQ(run({}), start + "Collecting samples...\n\nADC_AVG:       0.000000\n");
+}
+
+TEST_F(SocketHub, AnExtendedOffsetAndThePulsesAreStoredAndTakenOver) {
+  const auto hub = startHub("whiskel", 10,
+                            {"sensor.proximity_raw.noise=0", "sensor.proximity_raw.scale=1",
+                             "world.target_distance=100000", "world.window_crosstalk=300"});
+  const auto run = [&](const std::vector<std::string>& words) { return runProx("whiskel", words); };
+  // 26 of 32 pulses, and an offset of 64: 236 counts are left, of which 26/32 are seen.
+  const std::string start = "Searching for proximity sensor...\n";
+  EXPECT_EQ(run({"ppulse", "236"}), start +
+                                        "Enabling pulse number calibration...\n"
+                                        "Proximity pulse number calibration begins.\n"
+                                        "Collecting samples...\n\nADC_AVG:     192.000000\n"
+                                        "PPULSE:        31.000000\nWriting registry...\n"
+                                        "Proximity pulse number calibration succeeded.\n");
+  EXPECT_EQ(run({"ore", "enable", "16", "4"}), start + "Enabling ORE...\nORE enabled.\n");
+  EXPECT_EQ(run({"poffset", "-w"}), start +
+                                        "Disabling POFFSET calibration...\nPOFFSET disabled.\n"
+                                        "Collecting samples...\n\nADC_AVG:       0.000000\n"
+                                        "ADC_ORE:       4.000000\nADC_POFFSET:      44.000000\n\n"
+                                        "NEW ORE:             4.000000\nNEW POFFSET:        44.000000\n\n"
+                                        "Writing registry...\nProximity poffset calibration succeeded.\n");
+  EXPECT_EQ(registryFile("proxchipw_0_platform.prox.fac_cal"),
+            "{\n  \"items\": [\n"
+            "    {\"name\": \"ore\", \"version\": 1, \"int\": 4},\n"
+            "    {\"name\": \"poffset\", \"version\": 1, \"int\": 44},\n"
+            "    {\"name\": \"ppulse\", \"version\": 1, \"float\": 31.0},\n"
+            "    {\"name\": \"version\", \"int\": 1}\n"
+            "  ]\n}\n");
 }
 
 TEST_F(SocketHub, TwoRunsAtOnceDoNotDisturbEachOther) {
