@@ -194,13 +194,25 @@ void FuzzedHub::answerSensor(std::size_t index, const sns_client_request_msg& re
       return;
     case ssc::kCalibrationChangedRequest:
       return sendEvent(suidOf(index), ssc::kCalibrationChangedReply, "");
-    default:
+    default: {
+      const auto& answers = world_.sensors[index].answers;
+      const auto found = answers.find(request.msg_id());
+      if (found != answers.end()) return sendEvent(suidOf(index), found->second.first, found->second.second);
       return sendEvent(suidOf(index), ssc::kErrorEvent, errorPayload(SNS_STD_ERROR_NOT_SUPPORTED));
+    }
   }
 }
 
 void FuzzedHub::read(std::size_t index) {
-  sendEvent(suidOf(index), ssc::kSensorEvent, readingPayload(world_.sensors[index].reading));
+  const HubWorld::Sensor& sensor = world_.sensors[index];
+  sendEvent(suidOf(index), sensor.readingId, readingOf(suidOf(index), sensor.reading));
+}
+
+std::string FuzzedHub::readingOf(const ssc::SensorUid& suid, const std::vector<float>& values) const {
+  for (std::size_t i = 0; i < world_.sensors.size(); ++i) {
+    if (suid == suidOf(i) && world_.sensors[i].encode) return world_.sensors[i].encode(values);
+  }
+  return readingPayload(values);
 }
 
 void FuzzedHub::sendEvent(const ssc::SensorUid& suid, std::uint32_t messageId, std::string payload) {
@@ -241,7 +253,7 @@ void FuzzedHub::sendEvent(const ssc::SensorUid& suid, std::uint32_t messageId, s
     case Oddity::kOtherValues: {
       std::vector<float> values(input_.byte() % 8);
       for (float& value : values) value = input_.anyFloat();
-      payload = readingPayload(values);
+      payload = readingOf(suid, values);
       break;
     }
     case Oddity::kNone:

@@ -4,13 +4,16 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "fuzz/FuzzInput.h"
 #include "proto/sns_client.pb.h"
 #include "proto/sns_registry.pb.h"
+#include "ssc/MessageIds.h"
 #include "ssc/SensorUid.h"
 #include "ssc/transport/EmbeddedHub.h"
 
@@ -22,6 +25,11 @@ struct HubWorld {
     std::string dataType;
     std::string name;
     std::vector<float> reading;
+    std::uint32_t readingId = ssc::kSensorEvent;
+    /// The payload of a reading; without it that of a standard sensor.
+    std::function<std::string(const std::vector<float>&)> encode = nullptr;
+    /// How requests of the sensor's own are answered, by their message id: event id and payload.
+    std::map<std::uint32_t, std::pair<std::uint32_t, std::string>> answers = {};
   };
   std::vector<Sensor> sensors;
   std::map<std::string, sns_registry_data> registry;
@@ -52,6 +60,7 @@ class FuzzedHub final : public ssc::EmbeddedHub {
   void answerSensor(std::size_t index, const sns_client_request_msg& request);
   void read(std::size_t index);
 
+  [[nodiscard]] std::string readingOf(const ssc::SensorUid& suid, const std::vector<float>& values) const;
   /// Sends an event, or whatever the input makes of it.
   void sendEvent(const ssc::SensorUid& suid, std::uint32_t messageId, std::string payload);
   void sendReport(Duration delay, const std::string& payload);
