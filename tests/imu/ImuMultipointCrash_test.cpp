@@ -1,42 +1,13 @@
 // Steps that are killed: what earlier ones stored has to stay readable, to the byte.
-#include <csignal>
-
 #include <gtest/gtest.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include "imu/ImuMultipointFile.h"
+#include "support/RunAndKill.h"
 #include "support/TemporaryFolder.h"
 
 namespace {
 
 constexpr int kKills = 40;
-
-/// Runs `body` in a process of its own, over and over, and kills that at some moment after its first
-/// `progress` rounds.
-template <class Body>
-void runAndKill(int progress, Body body) {
-  int pipe[2];
-  ASSERT_EQ(::pipe(pipe), 0);
-  const pid_t child = ::fork();
-  ASSERT_GE(child, 0);
-  if (child == 0) {
-    for (;;) {
-      body();
-      if (::write(pipe[1], "", 1) != 1) ::_exit(1);
-    }
-  }
-  ::close(pipe[1]);
-  char round;
-  for (int i = 0; i < progress; ++i) {
-    if (::read(pipe[0], &round, 1) != 1) break;
-  }
-  ASSERT_EQ(::kill(child, SIGKILL), 0);
-  int status = 0;
-  ASSERT_EQ(::waitpid(child, &status, 0), child);
-  ::close(pipe[0]);
-  EXPECT_TRUE(WIFSIGNALED(status));
-}
 
 class ImuCrashTest : public testing::Test {
  protected:
@@ -51,7 +22,7 @@ TEST_F(ImuCrashTest, AKilledPhaseLeavesOnlyWholeLines) {
   const std::string line = info.ToString() + "\n";
   std::size_t lines = 0;
   for (int kill = 0; kill < kKills; ++kill) {
-    runAndKill(kill % 4, [&] { (void)appendCalibrationInfo(info, path); });
+    support::runAndKill(kill % 4, [&] { (void)appendCalibrationInfo(info, path); });
     const std::string content = support::readFile(path).value_or("");
     ASSERT_EQ(content.size() % line.size(), 0U) << content;
     ASSERT_GE(content.size() / line.size(), lines + static_cast<std::size_t>(kill % 4));
@@ -69,7 +40,7 @@ TEST_F(ImuCrashTest, AKilledPositionLeavesOnlyWholeRecords) {
   const ImuPosition position{{1, 2, 3}, {4, 5, 6}, {7}};
   std::size_t count = 0;
   for (int kill = 0; kill < kKills; ++kill) {
-    runAndKill(kill % 4, [&] { (void)appendPosition(position, path, FileStart::kKeep); });
+    support::runAndKill(kill % 4, [&] { (void)appendPosition(position, path, FileStart::kKeep); });
     std::vector<ImuPosition> positions;
     if (!support::readFile(path)) continue;
     ASSERT_EQ(readPositions(path, &positions), FileResult::kOk);
