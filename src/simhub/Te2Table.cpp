@@ -14,15 +14,8 @@ constexpr int kNumbersBefore = 3;       // the first pair, and the second one's 
 
 }  // namespace
 
-std::optional<int> readTe2FallingEdge(const std::string& path) {
-  // Not blocking: the file may be something that nobody ever writes to.
-  const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
-  if (fd < 0) return std::nullopt;
-  std::array<char, kMaxBytes + 1> text{};
-  const ssize_t count = ::read(fd, text.data(), kMaxBytes);
-  (void)::close(fd);
-  if (count <= 0) return std::nullopt;
-  const char* at = text.data();
+std::optional<int> parseTe2FallingEdge(const std::string& table) {
+  const char* at = table.c_str();
   long number = -1;
   for (int i = 0; i <= kNumbersBefore; ++i) {
     char* end = nullptr;
@@ -32,6 +25,17 @@ std::optional<int> readTe2FallingEdge(const std::string& path) {
   }
   if (number < 0 || number > kMaxTe2Delay) return std::nullopt;
   return static_cast<int>(number);
+}
+
+std::optional<int> readTe2FallingEdge(const std::string& path) {
+  // Not blocking: the file may be something that nobody ever writes to.
+  const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+  if (fd < 0) return std::nullopt;
+  std::array<char, kMaxBytes> text{};
+  const ssize_t count = ::read(fd, text.data(), text.size());
+  (void)::close(fd);
+  if (count <= 0) return std::nullopt;
+  return parseTe2FallingEdge({text.data(), static_cast<std::size_t>(count)});
 }
 
 }  // namespace simhub

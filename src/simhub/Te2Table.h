@@ -11,9 +11,12 @@ namespace simhub {
 inline constexpr int kMaxTe2Delay = 4095;  // display lines
 
 /// The falling edge of the second pair, which is the one for the mode that the light sensor is calibrated in.
-/// Nothing when there is no such file, or no such number in it of 0 to kMaxTe2Delay: then the display keeps
-/// the edge that it has of its own. What follows in the file makes no difference: whoever writes a shorter
-/// line over a longer one leaves the longer one's end.
+/// Nothing when the text has no such number of 0 to kMaxTe2Delay: then the display keeps the edge that it has
+/// of its own. What follows makes no difference: whoever writes a shorter line over a longer one leaves the
+/// longer one's end.
+[[nodiscard]] std::optional<int> parseTe2FallingEdge(const std::string& table);
+
+/// That of a file; nothing when there is none.
 [[nodiscard]] std::optional<int> readTe2FallingEdge(const std::string& path);
 
 }  // namespace simhub

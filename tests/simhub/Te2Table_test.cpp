@@ -9,11 +9,7 @@
 
 namespace {
 
-std::optional<int> edgeOf(const std::string& text) {
-  const TemporaryFolder folder;
-  std::ofstream(folder.Path("te2_table")) << text;
-  return simhub::readTe2FallingEdge(folder.Path("te2_table"));
-}
+constexpr auto edgeOf = simhub::parseTe2FallingEdge;
 
 TEST(Te2Table, IsTheFourthNumberInTheScansLine) {
   EXPECT_EQ(edgeOf("0998 1000 0998 1000 0998 1000 0998 1000"), 1000);
@@ -41,6 +37,20 @@ TEST(Te2Table, NothingForAnEdgeOutOfRange) {
   EXPECT_EQ(edgeOf("1 2 3 99999999999999999999"), std::nullopt);
   EXPECT_EQ(edgeOf("1 2 3 4095"), 4095);
   EXPECT_EQ(edgeOf("1 2 3 0"), 0);
+}
+
+TEST(Te2Table, IsReadFromAFile) {
+  const TemporaryFolder folder;
+  folder.WriteFile("te2_table", "2055 317 3240 1500 2354 13 2354 13");
+  EXPECT_EQ(simhub::readTe2FallingEdge(folder.Path("te2_table")), 1500);
+}
+
+TEST(Te2Table, EndOfALargeFileIsNotRead) {
+  const TemporaryFolder folder;
+  folder.WriteFile("te2_table", "1 2 3 4" + std::string(100000, ' '));
+  EXPECT_EQ(simhub::readTe2FallingEdge(folder.Path("te2_table")), 4);
+  folder.WriteFile("te2_table", "1 2 3" + std::string(100000, ' ') + "4");
+  EXPECT_EQ(simhub::readTe2FallingEdge(folder.Path("te2_table")), std::nullopt);
 }
 
 TEST(Te2Table, NothingWithoutAFileOrFromOneThatNobodyWrites) {

@@ -363,6 +363,16 @@ TEST(UnderDisplayAmbientLight, RefusesAndStaysSilentOnDemand) {
   EXPECT_EQ(handset.reading()[kIntegration], 250) << "carried out";
 }
 
+TEST(UnderDisplayAmbientLight, WhatAClientSetHoldsForTheNextOneUntilTheHubStartsAgain) {
+  Handset handset;
+  handset.setGain(5);
+  handset.hub->RemoveClient(handset.client);
+  handset.client = handset.hub->AddClient();
+  EXPECT_EQ(handset.reading()[kGain], 5);
+  handset.Restart();
+  EXPECT_EQ(handset.reading()[kGain], 11);
+}
+
 TEST(UnderDisplayAmbientLight, ForgetsItsRequestsWhenTheHubComesBack) {
   Handset handset({"fault.f.kind=hub_away", "fault.f.from=20", "fault.f.down_for=1"});
   handset.setGain(5);
