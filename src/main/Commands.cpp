@@ -6,6 +6,7 @@
 #include "imu/ImuThermalCalibrator.h"
 #include "light/AlsCalibrator.h"
 #include "light/ColorCalibrator.h"
+#include "light/UdAlsCalibrator.h"
 #include "mag/BaroCalibrator.h"
 #include "mag/MagCalibrator.h"
 #include "mag/MagCurrentSensitivity.h"
@@ -18,9 +19,9 @@ namespace {
 
 bool anyDevice(DeviceType) { return true; }
 
-/// The light sensor looks past the display, not through it.
-bool hasClassicAmbientLight(DeviceType type) {
-  return type != DeviceType::t5h5 && type != DeviceType::rufael && type != DeviceType::whiskel;
+/// The light sensor looks through the display.
+bool hasLightUnderDisplay(DeviceType type) {
+  return type == DeviceType::t5h5 || type == DeviceType::rufael || type == DeviceType::whiskel;
 }
 
 bool hasProximityThresholds(DeviceType type) { return type == DeviceType::o1v1; }
@@ -39,7 +40,8 @@ struct Command {
 // One row for each calibrator; of a command with variants the first that serves the device counts. The word
 // is compared as it stands, capitals included.
 constexpr Command kCommands[] = {
-    {"als", hasClassicAmbientLight, make<AlsCalibrator>},
+    {"als", hasLightUnderDisplay, make<UdAlsCalibrator>},
+    {"als", anyDevice, make<AlsCalibrator>},
     {"baro", anyDevice, make<BaroCalibrator>},
     {"color", anyDevice, make<ColorCalibrator>},
     {"imu-multipoint", anyDevice, make<ImuMultipointCalibrator>},
