@@ -48,28 +48,29 @@ Calibrator::Calibrator(ssc::Connection* hubConnection, const char* usage, const 
     : ssc::Client(hubConnection), usage_(usage), options_(options) {}
 
 void Calibrator::OnEvent(const sns_client_event_msg& message) {
-  constexpr const char* kFunction = "virtual void Calibrator::OnEvent(const sns_client_event_msg &)";
-  ssc::logFunc(kFunction, "-->");
-  const std::lock_guard<std::mutex> guard(mutex);
-  if (handleSensorEvents(message)) condition.notify_all();
-  ssc::logFunc(kFunction, "<--");
+  HandleEvents("virtual void Calibrator::OnEvent(const sns_client_event_msg &)", message);
 }
 
-/// Whether the wait is to end.
-bool Calibrator::handleSensorEvents(const sns_client_event_msg& message) {
+void Calibrator::HandleEvents(const char* function, const sns_client_event_msg& message) {
+  ssc::logFunc(function, "-->");
+  const std::lock_guard<std::mutex> guard(mutex);
   const ssc::SensorUid suid(message.suid());
-  for (const auto& event : message.events()) {
-    if (event.msg_id() != ssc::kSensorEvent) continue;
-    if (!event_.ParseFromString(event.payload())) {
-      ssc::log(ssc::kLogError, "Received malformed sensor event");
-      status = ssc::kMalformed;
-      return true;
-    }
-    if (isShort(suid, event_)) continue;
-    if (OnSensorEvent(suid, event.timestamp(), event_)) return true;
-  }
-  return false;
+  const auto isLast = [&](const Event& event) { return endsWait(suid, event); };
+  if (std::any_of(message.events().begin(), message.events().end(), isLast)) condition.notify_all();
+  ssc::logFunc(function, "<--");
 }
+
+bool Calibrator::endsWait(const ssc::SensorUid& suid, const Event& event) {
+  if (event.msg_id() != ssc::kSensorEvent) return OnOtherEvent(event);
+  if (!event_.ParseFromString(event.payload())) {
+    ssc::log(ssc::kLogError, "Received malformed sensor event");
+    status = ssc::kMalformed;
+    return true;
+  }
+  return !isShort(suid, event_) && OnSensorEvent(suid, event.timestamp(), event_);
+}
+
+bool Calibrator::OnOtherEvent(const Event& /*event*/) { return false; }
 
 bool Calibrator::isShort(const ssc::SensorUid& suid, const sns_std_sensor_event& event) {
   const auto info = sensorInfo.find(suid);

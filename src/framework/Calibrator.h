@@ -101,6 +101,16 @@ class Calibrator : public ssc::Client {
   [[nodiscard]] std::vector<std::string> GetAllConfigRequests() const;
   void DisableAllSensors();
 
+  // Events. On the event thread.
+
+  using Event = sns_client_event_msg::sns_client_event;
+  /// The whole of an OnEvent that traces itself as `function`: hands the message's events, one by one, to
+  /// OnSensorEvent and OnOtherEvent, and wakes the waiter when one of them, or an event that does not parse,
+  /// ends the wait. The rest of the message is then left alone.
+  void HandleEvents(const char* function, const sns_client_event_msg& message);
+  /// Mutex held: takes one event that is no reading of a stream. True ends the wait. Here: ignores it.
+  virtual bool OnOtherEvent(const Event& event);
+
   // Collecting.
 
   /// Streams all sensors for `period` or until a handler ends it, then disables them and, when asked, prints
@@ -140,6 +150,10 @@ class Calibrator : public ssc::Client {
   /// The same for groups that belong together, said once: in their order, up to the first that fails.
   [[nodiscard]] int WriteRegistry(const std::vector<std::pair<std::string, const sns_registry_data*>>& groups,
                                   WriteFailure failure = WriteFailure::kLogged);
+  /// The same without saying that it writes: for commands that print results in between.
+  [[nodiscard]] int WriteRegistryGroups(
+      const std::vector<std::pair<std::string, const sns_registry_data*>>& groups,
+      WriteFailure failure = WriteFailure::kLogged);
   /// Tells the sensors that their calibration changed; a failure is two warnings, since what was written
   /// stays.
   void NotifyOrWarn(const std::set<ssc::SensorUid>& suids,
@@ -159,7 +173,7 @@ class Calibrator : public ssc::Client {
  private:
   std::vector<std::string> beginCollection();
   void endCollection(bool print);
-  [[nodiscard]] bool handleSensorEvents(const sns_client_event_msg& message);
+  [[nodiscard]] bool endsWait(const ssc::SensorUid& suid, const Event& event);
   [[nodiscard]] bool isShort(const ssc::SensorUid& suid, const sns_std_sensor_event& event);
 
   std::uint32_t retryCount_ = 0;  ///< guarded by mutex

@@ -135,6 +135,11 @@ int Calibrator::WriteRegistry(const std::string& group, const sns_registry_data&
 int Calibrator::WriteRegistry(const std::vector<std::pair<std::string, const sns_registry_data*>>& groups,
                               WriteFailure failure) {
   ssc::say("Writing registry...\n");
+  return WriteRegistryGroups(groups, failure);
+}
+
+int Calibrator::WriteRegistryGroups(
+    const std::vector<std::pair<std::string, const sns_registry_data*>>& groups, WriteFailure failure) {
   ssc::RegistryUtil registry(connection);
   for (const auto& [group, data] : groups) {
     const int result = registry.Write(group, *data);

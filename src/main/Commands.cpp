@@ -6,6 +6,7 @@
 #include "imu/ImuThermalCalibrator.h"
 #include "light/AlsCalibrator.h"
 #include "light/ColorCalibrator.h"
+#include "light/UdAlsCalibrator.h"
 #include "mag/BaroCalibrator.h"
 #include "mag/MagCalibrator.h"
 #include "mag/MagCurrentSensitivity.h"
@@ -25,8 +26,6 @@ bool looksThroughDisplay(DeviceType type) {
   return type == DeviceType::t5h5 || type == DeviceType::rufael || type == DeviceType::whiskel;
 }
 
-bool hasClassicAmbientLight(DeviceType type) { return !looksThroughDisplay(type); }
-
 bool hasProximityThresholds(DeviceType type) { return type == DeviceType::o1v1; }
 
 bool hasProximityOffset(DeviceType type) { return type == DeviceType::p2m2 || type == DeviceType::e4d4; }
@@ -45,7 +44,8 @@ struct Command {
 // One row for each calibrator; of a command with variants the first that serves the device counts. The word
 // is compared as it stands, capitals included.
 constexpr Command kCommands[] = {
-    {"als", hasClassicAmbientLight, make<AlsCalibrator>},
+    {"als", looksThroughDisplay, make<UdAlsCalibrator>},
+    {"als", anyDevice, make<AlsCalibrator>},
     {"baro", anyDevice, make<BaroCalibrator>},
     {"color", anyDevice, make<ColorCalibrator>},
     {"imu-multipoint", anyDevice, make<ImuMultipointCalibrator>},

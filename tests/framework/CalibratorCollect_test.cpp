@@ -130,6 +130,25 @@ TEST_F(CalibratorCollect, StoresOnlySensorEvents) {
   EXPECT_EQ(calibrator->samples[a][0].time, 1.0);
 }
 
+TEST_F(CalibratorCollect, AnotherEventMayEndItBeforeTheRestOfItsMessage) {
+  whenStreamed([&](ScriptedHub& hub) {
+    hub.SendMessage(milliseconds(20), messageOf(a, {{1025, encodeReading({4})},
+                                                    {770, "ignored"},
+                                                    {771, "awaited"},
+                                                    {772, "never looked at"},
+                                                    {1025, encodeReading({5})}}));
+  });
+  std::vector<std::uint32_t> others;
+  calibrator->onOtherEvent = [&](std::uint32_t messageId) {
+    others.push_back(messageId);
+    return messageId == 771;
+  };
+  EXPECT_EQ(collect(seconds(1)).result, 0);
+  EXPECT_EQ(elapsed(), milliseconds(20));
+  EXPECT_EQ(others, std::vector<std::uint32_t>({770, 771}));
+  EXPECT_EQ(calibrator->samples[a].size(), 1U);
+}
+
 TEST_F(CalibratorCollect, AMalformedEventEndsItAndTheRestOfItsMessageIsDropped) {
   whenStreamed([&](ScriptedHub& hub) {
     hub.SendMessage(

@@ -172,6 +172,15 @@ TEST_F(CalibratorSteps, GroupsThatBelongTogetherAreAnnouncedOnce) {
   EXPECT_EQ(script->registry["group.bias"].items(0).flt(), 4.0F);
 }
 
+TEST_F(CalibratorSteps, GroupsAreWrittenWithoutAWordForThoseWhoSaidItBefore) {
+  sns_registry_data data;
+  addFloatItem(&data, "scale", 3, 1);
+  const Captured captured = capture([&] { return calibrator->WriteRegistryGroups({{kGroup, &data}}); });
+  EXPECT_EQ(captured.result, 0);
+  EXPECT_EQ(captured.out, "");
+  EXPECT_EQ(script->registry[kGroup].items(0).flt(), 3.0F);
+}
+
 TEST_F(CalibratorSteps, AGroupThatCannotBeWrittenKeepsTheFollowingOnesFromBeingWritten) {
   script->registryWritesFail = true;
   const sns_registry_data data;

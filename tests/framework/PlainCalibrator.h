@@ -21,7 +21,10 @@ class PlainCalibrator : public Calibrator {
     return endsAfter && endsAfter(samples[suid].size());
   }
 
+  bool OnOtherEvent(const Event& event) override { return onOtherEvent && onOtherEvent(event.msg_id()); }
+
   std::function<bool(std::size_t count)> endsAfter;
+  std::function<bool(std::uint32_t messageId)> onOtherEvent;
 
   using Calibrator::CollectSamples;
   using Calibrator::Conclude;
@@ -51,4 +54,5 @@ class PlainCalibrator : public Calibrator {
   using Calibrator::UsageError;
   using Calibrator::WriteFailure;
   using Calibrator::WriteRegistry;
+  using Calibrator::WriteRegistryGroups;
 };

@@ -1,0 +1,12 @@
+#include "light/UdAlsLux.h"
+
+#include "light/UdAlsFiles.h"
+
+float udAlsLuxScale(const std::vector<SampleData>& records) {
+  float sum = 0;
+  for (const SampleData& record : records) {
+    const float mean = record[kUdAlsMeanLux];
+    if (mean > 0) sum += record[kUdAlsReferenceLux] / mean;
+  }
+  return sum / static_cast<float>(records.size());
+}
