@@ -1,8 +1,9 @@
-// The simulated hub as a process of its own, on a Unix-domain socket.
+// The simulated hub as a process of its own, on a Unix-domain socket or in the place of a handset's hub.
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <memory>
 #include <string>
 #include <utility>
 #include <vector>
@@ -12,6 +13,7 @@
 #include <sys/signalfd.h>
 #include <unistd.h>
 
+#include "simhub/QrtrServer.h"
 #include "simhub/Scenario.h"
 #include "simhub/SimulatedRoot.h"
 #include "simhub/SocketServer.h"
@@ -22,13 +24,16 @@ constexpr int kUsageError = 2;
 constexpr double kMaxSpeed = 1e6;
 
 constexpr const char* kUsage =
-    "Usage: vantle-hub --socket PATH [--scenario NAME|FILE] [--set KEY=VALUE]... [--speed X] [--help]\n";
+    "Usage: vantle-hub {--socket PATH | --qrtr} [--scenario NAME|FILE] [--set KEY=VALUE]... [--speed X]\n"
+    "                  [--help]\n";
 constexpr const char* kHelp =
     "\n"
-    "Runs a simulated sensor hub on a Unix-domain socket, until SIGTERM or SIGINT.\n"
-    "Reach it with VANTLE_HUB=unix:PATH.\n"
+    "Runs a simulated sensor hub until SIGTERM or SIGINT. Programs on this machine reach\n"
+    "it with VANTLE_HUB=unix:PATH, or over QRTR like a handset's own hub.\n"
     "\n"
-    "  --socket PATH         Listen at PATH. A socket that nobody listens at is replaced.\n"
+    "  --socket PATH         Listen at the Unix-domain socket PATH. A socket that nobody\n"
+    "                          listens at is replaced.\n"
+    "  --qrtr                Register the hub's service with the name service of QRTR.\n"
     "  --scenario NAME|FILE  What is simulated: a built-in scenario or a TOML file.\n"
     "                          Default is o1v1.\n"
     "  --set KEY=VALUE       Change the scenario; KEY is dotted, as in world.pressure=990.\n"
@@ -41,13 +46,18 @@ constexpr const char* kEnvironment =
     "folder; without it, vantle-sim under XDG_STATE_HOME or ~/.local/state.\n";
 
 constexpr option kOptions[] = {
-    {"socket", required_argument, nullptr, 's'}, {"scenario", required_argument, nullptr, 'c'},
-    {"set", required_argument, nullptr, 'o'},    {"speed", required_argument, nullptr, 'x'},
-    {"help", no_argument, nullptr, 'h'},         {nullptr, 0, nullptr, 0},
+    {"socket", required_argument, nullptr, 's'},
+    {"qrtr", no_argument, nullptr, 'q'},
+    {"scenario", required_argument, nullptr, 'c'},
+    {"set", required_argument, nullptr, 'o'},
+    {"speed", required_argument, nullptr, 'x'},
+    {"help", no_argument, nullptr, 'h'},
+    {nullptr, 0, nullptr, 0},
 };
 
 struct Arguments {
-  std::string socket;
+  std::string socket;  ///< empty: QRTR
+  bool qrtr = false;
   std::string scenario;
   std::vector<std::string> overrides;
   double speed = 1;
@@ -87,6 +97,9 @@ int parseArguments(int argc, char** argv, Arguments* arguments) {
       case 's':
         arguments->socket = optarg;
         break;
+      case 'q':
+        arguments->qrtr = true;
+        break;
       case 'c':
         arguments->scenario = optarg;
         break;
@@ -106,7 +119,12 @@ int parseArguments(int argc, char** argv, Arguments* arguments) {
     }
   }
   if (optind < argc) return 1 + usageError(std::string("unexpected argument: ") + argv[optind]);
-  if (arguments->socket.empty()) return 1 + usageError("--socket PATH is missing");
+  if (arguments->socket.empty() && !arguments->qrtr) {
+    return 1 + usageError("--socket PATH or --qrtr is missing");
+  }
+  if (!arguments->socket.empty() && arguments->qrtr) {
+    return 1 + usageError("--socket and --qrtr exclude each other");
+  }
   return 0;
 }
 
@@ -120,24 +138,31 @@ int openStopSignals() {
   return ::signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK);
 }
 
-int serve(const Arguments& arguments, simhub::Scenario scenario) {
+void diagnose(const std::string& text) { (void)std::fprintf(stderr, "vantle-hub: %s\n", text.c_str()); }
+
+std::unique_ptr<simhub::HubServer> makeServer(const Arguments& arguments, const std::string& root,
+                                              simhub::Scenario scenario, std::string* error) {
   simhub::SocketServerOptions options;
   options.path = arguments.socket;
   options.speed = arguments.speed;
+  options.files = simhub::hubFiles(root);
+  if (!arguments.qrtr) return simhub::SocketServer::Create(options, std::move(scenario), diagnose, error);
+  return simhub::QrtrServer::Create(options, simhub::QrtrPort::OfThisMachine(), std::move(scenario), diagnose,
+                                    error);
+}
+
+int serve(const Arguments& arguments, simhub::Scenario scenario) {
   std::string error;
   const std::string root = simhub::simulatedRoot(&error);
   if (root.empty() || !simhub::prepareSimulatedRoot(root, &error)) return fail(error);
-  options.files = simhub::hubFiles(root);
 
   const int stop = openStopSignals();
   if (stop < 0) return fail(std::string("signals: ") + std::strerror(errno));
   const std::string name = scenario.name;
-  const auto server = simhub::SocketServer::Create(
-      options, std::move(scenario),
-      [](const std::string& text) { (void)std::fprintf(stderr, "vantle-hub: %s\n", text.c_str()); }, &error);
+  const auto server = makeServer(arguments, root, std::move(scenario), &error);
   if (server == nullptr) return fail(error);
-  (void)std::fprintf(stderr, "vantle-hub: listening on %s (scenario %s)\n", options.path.c_str(),
-                     name.c_str());
+  const std::string where = arguments.qrtr ? "QRTR" : arguments.socket;
+  diagnose("listening on " + where + " (scenario " + name + ")");
   const int failure = server->Run(stop);
   (void)::close(stop);
   return failure == 0 ? EXIT_SUCCESS : fail(std::strerror(failure));

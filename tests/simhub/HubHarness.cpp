@@ -38,8 +38,9 @@ void HubHarness::Deliver(simhub::ClientId to, qmi::Bytes datagram) {
   }
 }
 
-bool HubHarness::SendAs(simhub::ClientId from, const simhub::Suid& suid, std::uint32_t messageId,
-                        const std::string& payload, std::uint32_t batchMicroseconds) {
+std::vector<std::uint8_t> requestDatagram(std::uint16_t transaction, const simhub::Suid& suid,
+                                          std::uint32_t messageId, const std::string& payload,
+                                          std::uint32_t batchMicroseconds) {
   sns_client_request_msg message;
   suid.CopyTo(message.mutable_suid());
   message.set_msg_id(messageId);
@@ -51,8 +52,14 @@ bool HubHarness::SendAs(simhub::ClientId from, const simhub::Suid& suid, std::ui
   const std::string bytes = message.SerializeAsString();
   std::vector<std::uint8_t> datagram;
   EXPECT_TRUE(qmi::encodeRequest(
-      ++transaction, {reinterpret_cast<const std::uint8_t*>(bytes.data()), bytes.size()}, &datagram));
-  return hub->HandleDatagram(from, datagram);
+      transaction, {reinterpret_cast<const std::uint8_t*>(bytes.data()), bytes.size()}, &datagram));
+  return datagram;
+}
+
+bool HubHarness::SendAs(simhub::ClientId from, const simhub::Suid& suid, std::uint32_t messageId,
+                        const std::string& payload, std::uint32_t batchMicroseconds) {
+  return hub->HandleDatagram(from,
+                             requestDatagram(++transaction, suid, messageId, payload, batchMicroseconds));
 }
 
 bool HubHarness::Send(const simhub::Suid& suid, std::uint32_t messageId, const std::string& payload,

@@ -33,6 +33,12 @@ struct SeenResponse {
   qmi::Response response;
 };
 
+/// A request as a client sends it.
+[[nodiscard]] std::vector<std::uint8_t> requestDatagram(std::uint16_t transaction, const simhub::Suid& suid,
+                                                        std::uint32_t messageId,
+                                                        const std::string& payload = {},
+                                                        std::uint32_t batchMicroseconds = 0);
+
 class HubHarness : public simhub::HubOutput {
  public:
   /// A hub of the scenario (a built-in name) with overrides. Fails the test when there is none.

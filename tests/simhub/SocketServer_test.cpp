@@ -13,8 +13,7 @@
 #include <sys/un.h>
 #include <unistd.h>
 
-#include "proto/sns_client.pb.h"
-#include "proto/sns_std.pb.h"
+#include "simhub/HubHarness.h"
 #include "simhub/Protocol.h"
 #include "simhub/Suid.h"
 #include "simhub/TemporaryFolder.h"
@@ -54,18 +53,7 @@ class Client {
               static_cast<ssize_t>(datagram.size()));
   }
   void Send(const simhub::Suid& suid, std::uint32_t messageId, const std::string& payload = {}) {
-    sns_client_request_msg message;
-    suid.CopyTo(message.mutable_suid());
-    message.set_msg_id(messageId);
-    message.mutable_susp_config()->set_client_proc_type(SNS_STD_CLIENT_PROCESSOR_APSS);
-    message.mutable_susp_config()->set_delivery_type(SNS_CLIENT_DELIVERY_WAKEUP);
-    if (!payload.empty()) message.mutable_request()->set_payload(payload);
-    message.mutable_request();
-    const std::string bytes = message.SerializeAsString();
-    std::vector<std::uint8_t> datagram;
-    ASSERT_TRUE(qmi::encodeRequest(
-        ++transaction_, {reinterpret_cast<const std::uint8_t*>(bytes.data()), bytes.size()}, &datagram));
-    SendRaw(datagram);
+    SendRaw(requestDatagram(++transaction_, suid, messageId, payload));
   }
 
   enum class Got { kDatagram, kNothing, kEnd };
@@ -140,12 +128,6 @@ class SocketServerTest : public testing::Test {
 
 const simhub::Suid kPressure = simhub::suidForName("pressure");
 
-std::string rate(float hertz) {
-  sns_std_sensor_config config;
-  config.set_sample_rate(hertz);
-  return config.SerializeAsString();
-}
-
 TEST_F(SocketServerTest, AnswersARequest) {
   const auto server = start();
   ASSERT_NE(server, nullptr) << error;
@@ -162,7 +144,7 @@ TEST_F(SocketServerTest, StreamsInMultiplesOfRealTime) {
   const auto server = start({}, 100);
   Client client(path);
   const auto began = SteadyClock::now();
-  client.Send(kPressure, simhub::kStreamConfigRequest, rate(20));
+  client.Send(kPressure, simhub::kStreamConfigRequest, ratePayload(20));
   (void)receive(*server, client, 1 + 40);
   const auto took = SteadyClock::now() - began;
   EXPECT_GT(took, std::chrono::milliseconds(19));  // 2 s at a hundred times the speed
@@ -172,7 +154,7 @@ TEST_F(SocketServerTest, ServesManyClientsEachItsOwn) {
   const auto server = start({}, 100);
   Client one(path);
   Client two(path);
-  one.Send(kPressure, simhub::kStreamConfigRequest, rate(20));
+  one.Send(kPressure, simhub::kStreamConfigRequest, ratePayload(20));
   (void)receive(*server, one, 5);
   two.Send(kPressure, simhub::kAttributesRequest);
   const auto datagrams = receive(*server, two, 2);
@@ -196,7 +178,7 @@ TEST_F(SocketServerTest, ClientThatDoesNotReadIsDisconnectedAndHoldsNobodyUp) {
   const auto server = start({"sensor.pressure.rates=[100000]"}, 1000);
   Client lazy(path);
   Client busy(path);
-  lazy.Send(kPressure, simhub::kStreamConfigRequest, rate(100'000));
+  lazy.Send(kPressure, simhub::kStreamConfigRequest, ratePayload(100'000));
   ASSERT_TRUE(runUntil(*server, [&] { return server->ClientCount() == 2; }));
   ASSERT_TRUE(runUntil(*server, [&] { return server->ClientCount() == 1; }));
   EXPECT_THAT(diagnostics, ElementsAre(HasSubstr("does not read")));
@@ -211,7 +193,7 @@ TEST_F(SocketServerTest, SlowReaderGetsEverythingInOrder) {
                              "fault.f.sensor=pressure", "fault.f.after=" + std::to_string(kReadings)},
                             100);
   Client client(path);
-  client.Send(kPressure, simhub::kStreamConfigRequest, rate(10'000));
+  client.Send(kPressure, simhub::kStreamConfigRequest, ratePayload(10'000));
   const auto deadline = SteadyClock::now() + std::chrono::milliseconds(30);
   ASSERT_TRUE(runUntil(*server, [&] { return SteadyClock::now() > deadline; }));
   const auto datagrams = receive(*server, client, 1 + kReadings);
@@ -231,7 +213,7 @@ TEST_F(SocketServerTest, SlowReaderGetsEverythingInOrder) {
 TEST_F(SocketServerTest, HubThatGoesAwayEndsConnectionsAndComesBack) {
   const auto server = start({"fault.f.kind=hub_away", "fault.f.after=5", "fault.f.down_for=20"}, 100);
   Client client(path);
-  client.Send(kPressure, simhub::kStreamConfigRequest, rate(20));
+  client.Send(kPressure, simhub::kStreamConfigRequest, ratePayload(20));
   EXPECT_TRUE(ends(*server, client));
   EXPECT_FALSE(folder.Exists("hub.sock"));
   EXPECT_FALSE(Client(path).IsConnected());

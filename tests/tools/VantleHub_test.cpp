@@ -13,6 +13,7 @@
 #include <gtest/gtest.h>
 #include <poll.h>
 #include <spawn.h>
+#include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -124,14 +125,15 @@ class VantleHub : public testing::Test {
 TEST_F(VantleHub, HelpGoesToStandardOutput) {
   Process hub({"--help"});
   EXPECT_EQ(hub.Wait(), 0);
-  EXPECT_THAT(hub.out, StartsWith("Usage: vantle-hub --socket PATH"));
+  EXPECT_THAT(hub.out, StartsWith("Usage: vantle-hub {--socket PATH | --qrtr}"));
   EXPECT_THAT(hub.out, HasSubstr("e4d4, o1v1, p2m2, rufael, t5h5, whiskel."));
   EXPECT_THAT(hub.err, IsEmpty());
 }
 
 TEST_F(VantleHub, MistakesInArgumentsShowTheUsageAndEndWithTwo) {
   const std::vector<std::pair<std::vector<std::string>, std::string>> mistakes = {
-      {{}, "--socket PATH is missing"},
+      {{}, "--socket PATH or --qrtr is missing"},
+      {{"--qrtr", "--socket", socket}, "--socket and --qrtr exclude each other"},
       {{"--socket"}, "unknown option or missing value: --socket"},
       {{"--sokcet", socket}, "unknown option or missing value: --sokcet"},
       {{"--socket", socket, "extra"}, "unexpected argument: extra"},
@@ -158,6 +160,16 @@ TEST_F(VantleHub, WhatCannotBeSimulatedEndsWithOne) {
   Process tooLong({"--socket", std::string(200, 'a')});
   EXPECT_EQ(tooLong.Wait(), 1);
   EXPECT_THAT(tooLong.err, HasSubstr("longer than 107 bytes"));
+}
+
+TEST_F(VantleHub, MachineWithoutQrtrIsSaid) {
+  if (const int qrtr = ::socket(AF_QIPCRTR, SOCK_DGRAM | SOCK_CLOEXEC, 0); qrtr >= 0) {
+    ::close(qrtr);
+    GTEST_SKIP() << "this machine has QRTR";
+  }
+  Process hub({"--qrtr"});
+  EXPECT_EQ(hub.Wait(), 1);
+  EXPECT_THAT(hub.err, StartsWith("vantle-hub: QRTR cannot be used on this machine: "));
 }
 
 TEST_F(VantleHub, ListensUntilItIsAskedToStop) {

@@ -52,10 +52,10 @@ int openEmbeddedLink(const std::string& description, const EmbeddedHubFactory& e
 #endif
 
 int openQrtrLink(const char* advice, HubLink* link) {
-  const int result = QrtrTransport::Connect(&link->transport);
+  std::string reason;
+  const int result = QrtrTransport::Connect(&link->transport, &reason);
   if (result != kOk) {
-    log(kLogError, "No sensor hub: QRTR has no service %u%s%s", qmi::kHubServiceId,
-        *advice != '\0' ? ". " : "", advice);
+    log(kLogError, "No sensor hub: %s%s%s", reason.c_str(), *advice != '\0' ? ". " : "", advice);
     return result;
   }
   link->clock = std::make_unique<RealClock>();

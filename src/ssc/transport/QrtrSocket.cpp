@@ -3,12 +3,13 @@
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
+#include <thread>
 #include <utility>
 
-#include <linux/qrtr.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
 
+#include "ssc/transport/CallLimit.h"
 #include "ssc/transport/Descriptor.h"
 
 namespace ssc {
@@ -17,16 +18,10 @@ namespace {
 /// A full queue loses packets for good, the one that says that the hub went away among them.
 constexpr int kReceiveBuffer = 4 * 1024 * 1024;
 
+constexpr std::chrono::milliseconds kFullQueuePause{2};
+
 /// Between one failure to receive and the next.
 constexpr std::chrono::milliseconds kFailurePause{100};
-
-sockaddr_qrtr socketAddress(const QrtrAddress& address) {
-  sockaddr_qrtr result{};
-  result.sq_family = AF_QIPCRTR;
-  result.sq_node = address.node;
-  result.sq_port = address.port;
-  return result;
-}
 
 class KernelSocket final : public QrtrSocket {
  public:
@@ -35,15 +30,8 @@ class KernelSocket final : public QrtrSocket {
   [[nodiscard]] std::uint32_t LocalNode() const override { return node_; }
 
   [[nodiscard]] int Send(const QrtrAddress& to, qmi::Bytes packet) override {
-    const sockaddr_qrtr address = socketAddress(to);
-    for (;;) {
-      // The family refuses every flag but MSG_DONTWAIT.
-      if (::sendto(socket_.get(), packet.data(), packet.size(), MSG_DONTWAIT,
-                   reinterpret_cast<const sockaddr*>(&address), sizeof address) >= 0) {
-        return 0;
-      }
-      if (errno != EINTR) return -errno;
-    }
+    const sockaddr_qrtr address = qmi::toSocketAddress(to);
+    return sendWithin(kSendLimit, socket_.get(), &address, sizeof address, packet);
   }
 
   [[nodiscard]] Outcome Receive(Clock::TimePoint deadline, QrtrAddress* from,
@@ -73,7 +61,7 @@ class KernelSocket final : public QrtrSocket {
       failedBefore_ = false;
       if ((message.msg_flags & MSG_TRUNC) != 0) continue;
       packet->resize(static_cast<std::size_t>(length));
-      *from = {address.sq_node, address.sq_port};
+      *from = qmi::fromSocketAddress(address);
       return Outcome::kPacket;
     }
   }
@@ -101,10 +89,29 @@ class KernelSocket final : public QrtrSocket {
 
 }  // namespace
 
+int sendWithin(std::chrono::milliseconds limit, int fd, const void* address, std::uint32_t addressSize,
+               qmi::Bytes packet) {
+  const CallLimit guard(limit);
+  if (!guard.works()) return -EAGAIN;
+  for (;;) {
+    // The router family refuses every flag but MSG_DONTWAIT, and waits for other processors in spite of it.
+    const auto* to = static_cast<const sockaddr*>(address);
+    if (::sendto(fd, packet.data(), packet.size(), 0, to, addressSize) >= 0) return 0;
+    const int error = errno;
+    if (error != EINTR && error != ENOSPC) return -error;
+    if (guard.passed()) return -ETIMEDOUT;
+    // On this machine a receiver whose queue is full refuses instead of making the sender wait.
+    if (error == ENOSPC) std::this_thread::sleep_for(kFullQueuePause);
+  }
+}
+
 std::unique_ptr<QrtrSocket> QrtrSocket::Open() {
   Descriptor socket(::socket(AF_QIPCRTR, SOCK_DGRAM | SOCK_CLOEXEC, 0));
   if (!socket.valid()) return nullptr;
-  ::setsockopt(socket.get(), SOL_SOCKET, SO_RCVBUF, &kReceiveBuffer, sizeof kReceiveBuffer);
+  // Beyond the limit for everybody, where the program may do that.
+  if (::setsockopt(socket.get(), SOL_SOCKET, SO_RCVBUFFORCE, &kReceiveBuffer, sizeof kReceiveBuffer) != 0) {
+    ::setsockopt(socket.get(), SOL_SOCKET, SO_RCVBUF, &kReceiveBuffer, sizeof kReceiveBuffer);
+  }
   sockaddr_qrtr address{};
   socklen_t length = sizeof address;
   if (::getsockname(socket.get(), reinterpret_cast<sockaddr*>(&address), &length) != 0) return nullptr;

@@ -1,32 +1,33 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <memory>
 #include <vector>
 
-#include "qmi/Qmi.h"
+#include "qmi/Qrtr.h"
 #include "ssc/Clock.h"
 
 namespace ssc {
 
-/// Where a QRTR packet comes from or goes to.
-struct QrtrAddress {
-  std::uint32_t node = 0;
-  std::uint32_t port = 0;
-  friend bool operator==(const QrtrAddress&, const QrtrAddress&) = default;
-};
+using qmi::QrtrAddress;
 
 /// A socket of the handset's router family: packets to and from node and port. Tests put a stand-in here.
 class QrtrSocket {
  public:
   virtual ~QrtrSocket() = default;
 
-  /// The socket of this machine; null when it has no QRTR.
+  /// The socket of this machine. Null when it has no QRTR or lets this program have none, with the reason in
+  /// errno.
   static std::unique_ptr<QrtrSocket> Open();
 
   [[nodiscard]] virtual std::uint32_t LocalNode() const = 0;
 
-  /// 0 or a negated errno.
+  /// How long a packet may wait to be sent. Another processor that has stopped, or died without a word, stops
+  /// confirming packets; from the eleventh on a sender would wait for it for ever.
+  static constexpr std::chrono::milliseconds kSendLimit{1000};
+
+  /// 0 or a negated errno: -ETIMEDOUT after kSendLimit. Meanwhile the socket can receive nothing either.
   [[nodiscard]] virtual int Send(const QrtrAddress& to, qmi::Bytes packet) = 0;
 
   enum class Outcome { kPacket, kDeadline, kInterrupted, kFailed };
@@ -37,5 +38,10 @@ class QrtrSocket {
   /// Makes the running Receive, or else the next one, return kInterrupted. Any thread.
   virtual void Interrupt() = 0;
 };
+
+/// Sends one packet over the socket `fd` as QrtrSocket::Send does, whatever family the socket is of; `limit`
+/// in place of kSendLimit.
+[[nodiscard]] int sendWithin(std::chrono::milliseconds limit, int fd, const void* address,
+                             std::uint32_t addressSize, qmi::Bytes packet);
 
 }  // namespace ssc

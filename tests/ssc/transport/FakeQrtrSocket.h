@@ -2,14 +2,12 @@
 // Nothing waits: an empty queue is a deadline that has passed.
 #pragma once
 
-#include <cstring>
+#include <chrono>
 #include <deque>
+#include <functional>
 #include <memory>
 #include <utility>
 #include <vector>
-
-#include <endian.h>
-#include <linux/qrtr.h>
 
 #include "ssc/Wire.h"
 #include "ssc/transport/QrtrSocket.h"
@@ -57,6 +55,8 @@ struct QrtrTraffic {
   int sendResult = 0;
   int lookupResult = 0;  ///< of packets to the name service
   int interrupts = 0;
+  std::chrono::milliseconds timePerPacket{0};
+  std::function<void()> packetTaken = [] {};
   int failures = 0;  ///< receives that fail before anything else comes in
 
   void control(Datagram bytes) { incoming.push_back({kNameService, std::move(bytes)}); }
@@ -86,6 +86,7 @@ class FakeQrtrSocket final : public ssc::QrtrSocket {
       return Outcome::kFailed;
     }
     if (traffic_->incoming.empty()) return Outcome::kDeadline;
+    traffic_->packetTaken();
     *from = traffic_->incoming.front().address;
     *packet = std::move(traffic_->incoming.front().bytes);
     traffic_->incoming.pop_front();

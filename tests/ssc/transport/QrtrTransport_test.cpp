@@ -1,7 +1,10 @@
 #include "ssc/transport/QrtrTransport.h"
 
+#include <algorithm>
 #include <cerrno>
+#include <chrono>
 #include <memory>
+#include <mutex>
 #include <string>
 #include <vector>
 
@@ -22,11 +25,25 @@ constexpr Address kHub{9, 0x4007};
 constexpr Address kSecondHub{9, 0x4008};
 constexpr Address kStranger{9, 0x4111};
 
+constexpr std::chrono::seconds kSilence = ssc::QrtrTransport::kSilence;
+
+/// Time that the test sets.
+class SetClock final : public Clock {
+ public:
+  [[nodiscard]] TimePoint now() const override { return time; }
+  void wait(ssc::Condition&, std::unique_lock<std::mutex>&, Duration) override {}
+  void notifyAll(ssc::Condition&) override {}
+  void sleepFor(Duration duration) override { time += duration; }
+
+  TimePoint time{std::chrono::hours(1)};
+};
+
 class QrtrTransportTest : public testing::Test {
  protected:
   int connect() {
-    return ssc::QrtrTransport::ConnectOver(std::make_unique<FakeQrtrSocket>(traffic_), ssc::RealClock(),
-                                           &transport_);
+    traffic_->packetTaken = [this] { clock_->time += traffic_->timePerPacket; };
+    return ssc::QrtrTransport::ConnectOver(std::make_unique<FakeQrtrSocket>(traffic_), clock_, &transport_,
+                                           &reason_);
   }
   void connectToHub() {
     traffic_->control(newServer(kHub));
@@ -66,8 +83,23 @@ class QrtrTransportTest : public testing::Test {
     return sent ? traffic_->sent.back().address : Address{};
   }
 
+  /// Lets so much time pass without a word from anybody.
+  void silence(Clock::Duration duration) {
+    clock_->time += duration;
+    EXPECT_EQ(received(), "");
+  }
+  /// How often the name service was asked for its list.
+  [[nodiscard]] std::size_t lookups() const {
+    return static_cast<std::size_t>(
+        std::count_if(traffic_->sent.begin(), traffic_->sent.end(), [](const auto& packet) {
+          return packet.address == kNameService && packet.bytes[0] == QRTR_TYPE_NEW_LOOKUP;
+        }));
+  }
+
   std::shared_ptr<QrtrTraffic> traffic_ = std::make_shared<QrtrTraffic>();
+  std::shared_ptr<SetClock> clock_ = std::make_shared<SetClock>();
   std::unique_ptr<Transport> transport_;
+  std::string reason_;
 };
 
 TEST_F(QrtrTransportTest, AsksTheLocalNameServiceForTheHubsService) {
@@ -92,14 +124,19 @@ TEST_F(QrtrTransportTest, SendsToTheServerThatWasFoundAndTakesWhatItSends) {
 }
 
 TEST_F(QrtrTransportTest, MachineWithoutQrtrHasNoHub) {
-  EXPECT_EQ(ssc::QrtrTransport::ConnectOver(nullptr, ssc::RealClock(), &transport_), ssc::kNoHub);
+  errno = EAFNOSUPPORT;
+  EXPECT_EQ(ssc::QrtrTransport::ConnectOver(nullptr, clock_, &transport_, &reason_), ssc::kNoHub);
   EXPECT_EQ(transport_, nullptr);
+  EXPECT_EQ(reason_,
+            "QRTR, which leads to service 400, cannot be used on this machine "
+            "(Address family not supported by protocol)");
 }
 
 TEST_F(QrtrTransportTest, NameServiceThatCannotBeAskedMeansNoHub) {
   traffic_->lookupResult = -ENODEV;
   traffic_->control(newServer(kHub));
   EXPECT_EQ(connect(), ssc::kNoHub);
+  EXPECT_EQ(reason_, "QRTR's name service cannot be asked for service 400 (No such device)");
 }
 
 TEST_F(QrtrTransportTest, ListWithoutTheServiceMeansNoHub) {
@@ -108,12 +145,23 @@ TEST_F(QrtrTransportTest, ListWithoutTheServiceMeansNoHub) {
   traffic_->control(newServer(kHub));  // too late: the list has ended
   EXPECT_EQ(connect(), ssc::kNoHub);
   EXPECT_EQ(transport_, nullptr);
+  EXPECT_EQ(reason_, "QRTR's name service knows no service 400");
 }
 
 TEST_F(QrtrTransportTest, NoAnswerMeansNoHub) {
   EXPECT_EQ(connect(), ssc::kNoHub);
+  EXPECT_EQ(reason_, "QRTR's name service did not say within 1 s whether there is a service 400");
   traffic_->failures = 1;
   EXPECT_EQ(connect(), ssc::kNoHub);
+}
+
+TEST_F(QrtrTransportTest, StrangersDoNotHoldTheSearchUp) {
+  for (int i = 0; i < 100; ++i) traffic_->from(kStranger, {'x'});
+  traffic_->control(newServer(kHub));
+  traffic_->control(endOfList());
+  traffic_->timePerPacket = std::chrono::milliseconds(100);
+  EXPECT_EQ(connect(), ssc::kNoHub);
+  EXPECT_GT(traffic_->incoming.size(), 80U);
 }
 
 TEST_F(QrtrTransportTest, ServerFoundCountsThoughTheEndOfTheListWasLost) {
@@ -287,6 +335,99 @@ TEST_F(QrtrTransportTest, SendThatFailsForAnotherReasonKeepsTheConnection) {
   }
   EXPECT_EQ(received(), "");
   traffic_->sendResult = 0;
+  EXPECT_EQ(destination(), kHub);
+}
+
+TEST_F(QrtrTransportTest, AfterASilenceTheServersAreListedAgain) {
+  connectToHub();
+  silence(kSilence - std::chrono::milliseconds(1));
+  EXPECT_EQ(lookups(), 0U);
+  silence(std::chrono::milliseconds(1));
+  EXPECT_EQ(lookups(), 1U);
+  traffic_->control(newServer(kHub));
+  traffic_->control(endOfList());
+  EXPECT_EQ(received(), "");  // still the same hub
+  EXPECT_EQ(destination(), kHub);
+  silence(kSilence);
+  EXPECT_EQ(lookups(), 2U);
+}
+
+TEST_F(QrtrTransportTest, WhileTheHubSpeaksNobodyIsAsked) {
+  connectToHub();
+  for (int i = 0; i < 10; ++i) {
+    clock_->time += kSilence / 2;
+    traffic_->from(kHub, {'a'});
+    EXPECT_EQ(received(), "<a> ");
+  }
+  EXPECT_EQ(lookups(), 0U);
+}
+
+TEST_F(QrtrTransportTest, HubThatIsNotListedAnyMoreHasGone) {
+  // The notice was lost, and nothing is sent that would fail.
+  connectToHub();
+  silence(kSilence);
+  traffic_->control(endOfList());
+  EXPECT_EQ(received(), "down ");
+  EXPECT_EQ(destination(), Address{});
+  silence(kSilence);
+  EXPECT_EQ(lookups(), 2U);
+  traffic_->control(newServer(kSecondHub));  // nor did the notice come that it is back
+  traffic_->control(endOfList());
+  EXPECT_EQ(received(), "up ");
+  EXPECT_EQ(destination(), kSecondHub);
+}
+
+TEST_F(QrtrTransportTest, HubThatReturnedElsewhereAfterALostNoticeIsFound) {
+  connectToHub();
+  traffic_->control(newServer(kSecondHub));
+  EXPECT_EQ(received(), "");
+  EXPECT_EQ(lookups(), 1U);  // is the first still there?
+  traffic_->control(newServer(kSecondHub));
+  traffic_->control(endOfList());
+  EXPECT_EQ(received(), "down up ");
+  EXPECT_EQ(destination(), kSecondHub);
+}
+
+TEST_F(QrtrTransportTest, AnnouncementAmongTheListIsARestart) {
+  connectToHub();
+  silence(kSilence);
+  traffic_->control(newServer(kHub));
+  traffic_->control(newServer(kHub));
+  EXPECT_EQ(received(), "down up ");
+  traffic_->control(endOfList());
+  EXPECT_EQ(received(), "");
+  EXPECT_EQ(destination(), kHub);
+}
+
+TEST_F(QrtrTransportTest, DepartureAmongTheListCounts) {
+  connectToHub();
+  silence(kSilence);
+  traffic_->control(newServer(kHub));
+  traffic_->control(delServer(kHub));
+  traffic_->control(endOfList());
+  EXPECT_EQ(received(), "down ");
+  traffic_->control(newServer(kHub));
+  EXPECT_EQ(received(), "up ");
+}
+
+TEST_F(QrtrTransportTest, ServerThatCameBeforeTheListIsNoRestart) {
+  connectToHub();
+  traffic_->control(delServer(kHub));
+  EXPECT_EQ(received(), "down ");
+  silence(kSilence);
+  traffic_->control(newServer(kHub));  // announced just before the list was made
+  traffic_->control(newServer(kHub));
+  traffic_->control(endOfList());
+  EXPECT_EQ(received(), "up ");
+}
+
+TEST_F(QrtrTransportTest, ListThatNobodyTellsIsAskedForLaterAgain) {
+  connectToHub();
+  silence(kSilence);
+  silence(kSilence);
+  EXPECT_EQ(lookups(), 1U);
+  silence(ssc::QrtrTransport::kListPatience);
+  EXPECT_EQ(lookups(), 2U);
   EXPECT_EQ(destination(), kHub);
 }
 
