@@ -2,12 +2,17 @@
 // simulated time. Its folder stays between commands, so that what one stores the next one finds.
 #pragma once
 
+#include <cmath>
 #include <cstdlib>
 #include <string>
 #include <vector>
 
 #include "main/Driver.h"
 #include "main/SimulatedHandset.h"
+#include "simhub/Hub.h"
+#include "simhub/RegistryFiles.h"
+#include "simhub/RegistryStore.h"
+#include "simhub/RegistryValues.h"
 #include "support/Capture.h"
 #include "support/TemporaryFolder.h"
 
@@ -38,6 +43,17 @@ class TruthHandset {
     (void)::unsetenv("VANTLE_HUB");
     (void)::unsetenv("VANTLE_ROOT");
     return captured;
+  }
+
+  /// The number that the commands left in the registry: not a number where none of them wrote the group, or
+  /// there is no such item at its top.
+  [[nodiscard]] double Stored(const std::string& group, const std::string& item) const {
+    simhub::RegistryFiles files(simhub::hubFiles(folder_.path()).registryFolder);
+    simhub::RegistryStore store(files, {}, [](const std::string&) {});
+    store.Load();
+    sns_registry_data data;
+    if (store.Read(group, &data) != simhub::RegistryStore::Result::kOk) return std::nan("");
+    return simhub::registryNumber(data, item).value_or(std::nan(""));
   }
 
  private:
