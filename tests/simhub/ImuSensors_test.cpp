@@ -6,8 +6,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "simhub/Pose.h"
 #include "simhub/HubHarness.h"
+#include "simhub/Pose.h"
 
 namespace {
 
