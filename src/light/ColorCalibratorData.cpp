@@ -54,13 +54,13 @@ int ColorCalibrator::LoadData(std::vector<SampleData>* records) {
     return ssc::kInvalid;
   }
   ssc::say("Reading data file...\n");
-  records->clear();
   std::string content;
-  FileResult result = readWholeFile(ssc::devicePath(kColorDataFile), kMaxColorDataBytes, &content);
+  const FileResult result = readWholeFile(ssc::devicePath(kColorDataFile), kMaxColorDataBytes, &content);
   if (result == FileResult::kCannotOpen) {
     ssc::log(ssc::kLogError, "Failed to open color calibration data file");
     return ssc::kNotPermitted;
   }
+  records->clear();
   if (result == FileResult::kTooLarge) {
     ssc::log(ssc::kLogError, "Color calibration data file is larger than %zu bytes", kMaxColorDataBytes);
     return ssc::kInvalid;

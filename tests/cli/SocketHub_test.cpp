@@ -255,6 +255,46 @@ TEST_F(SocketHub, AnExtendedOffsetAndThePulsesAreStoredAndTakenOver) {
             "  ]\n}\n");
 }
 
+TEST_F(SocketHub, AColorCalibrationIsTakenOverAndVerified) {
+  // Without noise; each light has a hub of its own, as if somebody had moved the handset to the next lamp.
+  const auto under = [&](const std::string& light, const std::string& kelvin,
+                         const std::vector<std::string>& words) {
+    const auto hub = startHub("p2m2", 10,
+                              {light, "world.color_temperature=" + kelvin, "sensor.color_raw.noise=0",
+                               "sensor.ambient_light_raw.noise=0", "sensor.ambient_light_raw.scale=0.5"});
+    std::vector<std::string> all{"-d", "p2m2", "-q", "color", "-s", "2"};
+    all.insert(all.end(), words.begin(), words.end());
+    const support::Outcome outcome = support::run(vantle(all), kPatience);
+    EXPECT_TRUE(outcome.exitedWith(0)) << outcome.describe() << outcome.errors;
+    EXPECT_TRUE(hub->signal(SIGTERM));
+    EXPECT_TRUE(hub->wait(kPatience).exitedWith(0));
+    return outcome.output;
+  };
+  (void)under("world.infrared=5", "5000", {"-c"});
+  (void)under("world.illuminance=500", "2800", {"500", "2800"});
+  const std::string last = under("world.illuminance=1000", "6500", {"-w", "1000", "6500"});
+  EXPECT_NE(last.find("LUX_SCALE:       2.000000\n"), std::string::npos) << last;
+  EXPECT_NE(last.find("Writing registry...\nCalibration succeeded.\n"), std::string::npos) << last;
+  const std::string check = under("world.illuminance=700", "4000", {"-v", "1", "700", "4000"});
+  EXPECT_NE(check.find("LUX_MEAN:     700.000000\n"), std::string::npos) << check;
+  EXPECT_NE(check.find("Verification succeeded.\n"), std::string::npos) << check;
+}
+
+TEST_F(SocketHub, ASarCalibrationIsStoredForItsSensor) {
+  const auto hub = startHub("e4d4", 10, {"sensor.sar_1.noise=0", "sensor.sar_1.bias=[16353,100]"});
+  const support::Outcome outcome = support::run(vantle({"-d", "e4d4", "sar", "-i", "1"}), kPatience);
+  ASSERT_TRUE(outcome.exitedWith(0)) << outcome.describe() << outcome.errors;
+  EXPECT_EQ(outcome.output,
+            "Searching for SAR sensor...\nSAR calibration begins.\n"
+            "TOP_OFFSET: 16383\nBOT_OFFSET:   130\n"
+            "Writing registry...\nSAR calibration succeeded.\n");
+  EXPECT_EQ(registryFile("sarchip_1_platform.fac_cal"),
+            "{\n  \"items\": [\n"
+            "    {\"name\": \"max_offset_bottom\", \"version\": 1, \"float\": 130.0},\n"
+            "    {\"name\": \"max_offset_top\", \"version\": 1, \"float\": 16383.0}\n"
+            "  ]\n}\n");
+}
+
 TEST_F(SocketHub, TwoRunsAtOnceDoNotDisturbEachOther) {
   const auto hub = startHub("o1v1", 10);
   support::Process calibration;

@@ -178,6 +178,9 @@ void FuzzedHub::answerSensor(std::size_t index, const sns_client_request_msg& re
       auto* streamType = event.add_attributes();
       streamType->set_attr_id(ssc::kAttributeStreamType);
       streamType->mutable_value()->add_values()->set_sint(SNS_STD_SENSOR_STREAM_TYPE_STREAMING);
+      auto* hardwareId = event.add_attributes();
+      hardwareId->set_attr_id(ssc::kAttributeHardwareId);
+      hardwareId->mutable_value()->add_values()->set_sint(static_cast<std::int64_t>(index));
       return sendEvent(suidOf(index), ssc::kAttributesEvent, event.SerializeAsString());
     }
     case ssc::kStreamConfigRequest: {

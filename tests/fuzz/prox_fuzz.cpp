@@ -5,9 +5,11 @@
 #include <cmath>
 #include <string>
 #include <type_traits>
+#include <utility>
 #include <vector>
 
 #include "fuzz/FuzzCheck.h"
+#include "fuzz/FuzzedCommand.h"
 #include "fuzz/FuzzedHub.h"
 #include "proto/sns_oem_proximity.pb.h"
 #include "proto/sns_proximity.pb.h"
@@ -75,18 +77,11 @@ template <class Command>
 int runCommand(std::uint8_t mode, std::vector<std::string> words, ssc::Connection* connection) {
   words.insert(words.begin(), "prox");
   if (std::is_same_v<Command, UdProxCalibrator>) words.emplace_back("-w");
-  std::vector<char*> argv;
-  for (std::string& word : words) argv.push_back(word.data());
-  argv.push_back(nullptr);
   Calibrator::Arguments arguments;
   arguments.deviceType = DeviceType::t5h5;
   arguments.dryRun = (mode & kDryRun) != 0;
   arguments.reset = (mode & kReset) != 0;
-  arguments.quiet = true;
-  arguments.command = "prox";
-  arguments.argc = static_cast<std::int32_t>(words.size());
-  arguments.argv = argv.data();
-  return Command(connection).Run(arguments);
+  return fuzz::runCommand<Command>(arguments, std::move(words), connection);
 }
 
 }  // namespace
