@@ -35,7 +35,8 @@ class FuzzInput {
 
   /// A length of up to 255, and so many bytes as far as they are there.
   std::string text() {
-    const std::size_t length = std::min<std::size_t>(byte(), rest_.size());
+    const std::size_t asked = byte();
+    const std::size_t length = std::min(asked, rest_.size());
     const std::string value(rest_.begin(), rest_.begin() + static_cast<std::ptrdiff_t>(length));
     rest_ = rest_.subspan(length);
     return value;
