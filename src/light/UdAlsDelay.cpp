@@ -3,9 +3,9 @@
 #include <array>
 #include <cmath>
 #include <cstdio>
-#include <limits>
 
 #include "framework/Fits.h"
+#include "framework/Statistics.h"
 #include "light/TruncateToInt.h"
 #include "light/UdAlsFiles.h"
 
@@ -28,9 +28,7 @@ bool fitDelay(const std::vector<SampleData>& records, SampleData* coefficients) 
 float vertexOf(const SampleData& coefficients) {
   const auto linear = static_cast<double>(coefficients[1]);
   const auto quadratic = static_cast<double>(coefficients[2]);
-  const auto vertex = static_cast<float>(-0.5 * linear / quadratic);
-  // 0/0 is a negative not-a-number on x86 and a positive one on the handset: printed, they would differ.
-  return std::isnan(vertex) ? std::numeric_limits<float>::quiet_NaN() : vertex;
+  return withPlainNan(static_cast<float>(-0.5 * linear / quadratic));
 }
 
 float roundedToThreeDecimals(float delay) {

@@ -1,5 +1,6 @@
 #include "light/UdAlsGain.h"
 
+#include "framework/Statistics.h"
 #include "light/UdAlsFiles.h"
 
 namespace {
@@ -23,7 +24,7 @@ GainMeans meansByGain(const std::vector<SampleData>& records, std::size_t index)
 GainRatios gainRatios(const GainMeans& means) {
   GainRatios ratios = kNominalRatios;
   for (std::size_t i = 0; i < ratios.size(); ++i) {
-    if (means[i] > 0) ratios[i] = means.back() / means[i];
+    if (means[i] > 0) ratios[i] = withPlainNan(means.back() / means[i]);
   }
   return ratios;
 }

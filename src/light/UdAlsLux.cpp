@@ -1,5 +1,6 @@
 #include "light/UdAlsLux.h"
 
+#include "framework/Statistics.h"
 #include "light/UdAlsFiles.h"
 
 float udAlsLuxScale(const std::vector<SampleData>& records) {
@@ -8,5 +9,5 @@ float udAlsLuxScale(const std::vector<SampleData>& records) {
     const float mean = record[kUdAlsMeanLux];
     if (mean > 0) sum += record[kUdAlsReferenceLux] / mean;
   }
-  return sum / static_cast<float>(records.size());
+  return withPlainNan(sum / static_cast<float>(records.size()));
 }
