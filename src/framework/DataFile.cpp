@@ -28,8 +28,10 @@ class File {
     return ::fstat(file_.get(), &information) == 0 ? information.st_size : 0;
   }
 
-  /// Everything or nothing, and on the disk when it returns.
-  [[nodiscard]] bool append(std::string_view bytes) {
+  enum class Wait { kForDisk, kForNothing };
+
+  /// Everything or nothing, and on the disk when it returns if that is to be waited for.
+  [[nodiscard]] bool append(std::string_view bytes, Wait wait = Wait::kForDisk) {
     const off_t before = size();
     std::size_t written = 0;
     while (written < bytes.size()) {
@@ -39,7 +41,10 @@ class File {
       written += static_cast<std::size_t>(count);
     }
     // EINVAL: something that has no disk behind it.
-    if (written == bytes.size() && (::fsync(file_.get()) == 0 || errno == EINVAL)) return true;
+    const auto isOnDisk = [&] {
+      return wait == Wait::kForNothing || ::fsync(file_.get()) == 0 || errno == EINVAL;
+    };
+    if (written == bytes.size() && isOnDisk()) return true;
     truncate(before);
     return false;
   }
@@ -107,6 +112,12 @@ FileResult appendLinesToFile(const std::string& path, std::string_view text, Fil
   const bool hasDropped = dropUnfinishedLine(path, file);
   if (dropped != nullptr) *dropped = hasDropped;
   return file.append(text) ? FileResult::kOk : FileResult::kFailed;
+}
+
+FileResult appendToLogFile(const std::string& path, std::string_view line, FileStart start) {
+  File file(path, start);
+  if (!file.isOpen()) return FileResult::kCannotOpen;
+  return file.append(line, File::Wait::kForNothing) ? FileResult::kOk : FileResult::kFailed;
 }
 
 FileResult readWholeFile(const std::string& path, std::size_t maxBytes, std::string* content) {

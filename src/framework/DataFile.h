@@ -28,6 +28,8 @@ enum class FileStart { kKeep, kTruncate };
 /// have left (`*dropped`, may be null, tells). `text` ends with a newline.
 [[nodiscard]] FileResult appendLinesToFile(const std::string& path, std::string_view text, FileStart start,
                                            bool* dropped = nullptr);
+/// Appends a log's line, without waiting for the disk: a log may lose its end.
+[[nodiscard]] FileResult appendToLogFile(const std::string& path, std::string_view line, FileStart start);
 /// The whole content, if that is not more than `maxBytes`.
 [[nodiscard]] FileResult readWholeFile(const std::string& path, std::size_t maxBytes, std::string* content);
 

@@ -1,5 +1,8 @@
 #include "light/UdAlsCalibrator.h"
 
+#include <cerrno>
+#include <cstring>
+
 #include <unistd.h>
 
 #include "framework/CommandOptions.h"
@@ -119,7 +122,10 @@ int UdAlsCalibrator::Run(const Arguments& arguments) {
   if (result != ssc::kOk) return result;
   if (words_.clearOnly) {
     ssc::say("Removing data file...\n");
-    return ::unlink(ssc::devicePath(kUdAlsDataFile).c_str()) == 0 ? ssc::kOk : ssc::kNotPermitted;
+    // Where there is none, that is a failure too.
+    if (::unlink(ssc::devicePath(kUdAlsDataFile).c_str()) == 0) return ssc::kOk;
+    ssc::log(ssc::kLogError, "Unable to remove als calibration data file: %s", std::strerror(errno));
+    return ssc::kNotPermitted;
   }
   result = LookupSuid();
   return result == ssc::kOk ? dispatch() : result;
@@ -168,13 +174,13 @@ int UdAlsCalibrator::dispatch() {
     case UdAlsMode::kLux:
       return IsVerifying() ? Verify() : runLux();
     case UdAlsMode::kGainCalibration:
-      result = beginCalibration();
+      result = configure();
       return result == ssc::kOk ? runStep(kUdAlsGainLog, &UdAlsCalibrator::GainCalibrate) : result;
     case UdAlsMode::kIrGainCalibration:
-      result = beginCalibration();
+      result = configure();
       return result == ssc::kOk ? runStep(kUdAlsGainLog, &UdAlsCalibrator::IRGainCalibrate) : result;
     case UdAlsMode::kPwm:
-      result = beginCalibration();
+      result = configure();
       return result == ssc::kOk ? runStep(kUdAlsPwmLog, &UdAlsCalibrator::PwmCalibrate) : result;
     case UdAlsMode::kPattern:
       ssc::say("Display pattern noise calibration...\n");
@@ -200,11 +206,6 @@ int UdAlsCalibrator::configure() {
   if (!request) return ssc::kInvalid;
   ssc::say("%s", request->announcement);
   return sendRequest(*request);
-}
-
-int UdAlsCalibrator::beginCalibration() {
-  const int result = configure();
-  return result == ssc::kOk ? result : Conclude("Calibration", result);
 }
 
 int UdAlsCalibrator::sendRequest(const UdAlsRequest& request) {

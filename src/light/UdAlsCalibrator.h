@@ -76,8 +76,6 @@ class UdAlsCalibrator final : public AmbientLightCommand {
   /// "failed" is logged when it comes, and none.
   [[nodiscard]] int sendRequest(const UdAlsRequest& request);
   [[nodiscard]] int runLux();
-  /// configure() of a calibration, which closes with a line of its own when it fails.
-  [[nodiscard]] int beginCalibration();
   /// A step, as far as one is asked for, and the computation, as far as that is.
   [[nodiscard]] int runStep(const char* csvPath, int (UdAlsCalibrator::*calibrate)());
   [[nodiscard]] int sampleOnly();

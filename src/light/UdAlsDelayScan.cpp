@@ -84,10 +84,9 @@ int UdAlsCalibrator::scanTe2Delays() {
   ssc::say("ALS Delay = %f\n", static_cast<double>(words_.alsDelay));
   for (float delay = words_.te2DelayStart; delay <= words_.te2DelayEnd; delay += words_.te2DelayStep) {
     te2Delay_ = delay;
-    if (SetTe2(truncateToInt(delay - kTe2PulseWidth), truncateToInt(delay)) != ssc::kOk) {
-      return Conclude("Calibration", ssc::kNotPermitted);
-    }
-    const int result = SetAlsDelayAndCollectData(words_.alsDelay, kUdAlsTe2DelayLog);
+    int result = SetTe2(truncateToInt(delay - kTe2PulseWidth), truncateToInt(delay));
+    if (result != ssc::kOk) return result;
+    result = SetAlsDelayAndCollectData(words_.alsDelay, kUdAlsTe2DelayLog);
     if (result != ssc::kOk) return result;
   }
   return ssc::kOk;
@@ -95,7 +94,7 @@ int UdAlsCalibrator::scanTe2Delays() {
 
 int UdAlsCalibrator::SetAlsDelayAndCollectData(float delay, const char* csvPath) {
   words_.alsDelay = delay;
-  const int result = beginCalibration();
+  const int result = configure();
   return result == ssc::kOk ? CollectDelayCalData(csvPath) : result;
 }
 

@@ -118,15 +118,15 @@ int UdAlsCalibrator::SaveDataToCsv(const char* path, const SampleData& sample) {
   // With -r each sample starts the log anew, so that only the last one stays: the means are in the working
   // file.
   return requireWritten(
-      words_.clearData ? appendToFile(ssc::devicePath(path), kUdAlsLogHeader + line, FileStart::kTruncate)
-                       : appendToFile(ssc::devicePath(path), line, FileStart::kKeep));
+      words_.clearData ? appendToLogFile(ssc::devicePath(path), kUdAlsLogHeader + line, FileStart::kTruncate)
+                       : appendToLogFile(ssc::devicePath(path), line, FileStart::kKeep));
 }
 
 int UdAlsCalibrator::SaveDelayDataToCsv(const char* path, const SampleData& sample) {
   const int result = requireValues(sample);
   if (result != ssc::kOk) return result;
   const FileResult written =
-      appendToFile(ssc::devicePath(path), udAlsDelayLogLine(sample, delayOfStep()), FileStart::kKeep);
+      appendToLogFile(ssc::devicePath(path), udAlsDelayLogLine(sample, delayOfStep()), FileStart::kKeep);
   return written == FileResult::kCannotOpen ? ssc::kOk : requireWritten(written);
 }
 
@@ -172,7 +172,7 @@ void UdAlsCalibrator::removeDataFile() {
 }
 
 void UdAlsCalibrator::startLog(const char* path, const char* header) {
-  const FileResult result = appendToFile(ssc::devicePath(path), header, FileStart::kTruncate);
+  const FileResult result = appendToLogFile(ssc::devicePath(path), header, FileStart::kTruncate);
   if (result == FileResult::kOk) return;
   ssc::log(ssc::kLogWarn, "Unable to start the log %s", path);
 }

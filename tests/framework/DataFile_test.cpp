@@ -36,6 +36,15 @@ TEST_F(DataFileTest, WhatDoesNotFitOnTheDiskIsTakenBack) {
   EXPECT_EQ(content(), "sound");
 }
 
+TEST_F(DataFileTest, ALogGrowsLineByLineOrStartsAfresh) {
+  EXPECT_EQ(appendToLogFile(path, "a\n", FileStart::kKeep), FileResult::kOk);
+  EXPECT_EQ(appendToLogFile(path, "b\n", FileStart::kKeep), FileResult::kOk);
+  EXPECT_EQ(content(), "a\nb\n");
+  EXPECT_EQ(appendToLogFile(path, "c\n", FileStart::kTruncate), FileResult::kOk);
+  EXPECT_EQ(content(), "c\n");
+  EXPECT_EQ(appendToLogFile(path + "/none", "d\n", FileStart::kKeep), FileResult::kCannotOpen);
+}
+
 TEST_F(DataFileTest, AnUnfinishedLastLineIsDroppedBeforeTheNext) {
   bool dropped = true;
   EXPECT_EQ(appendLinesToFile(path, "a\n", FileStart::kKeep, &dropped), FileResult::kOk);

@@ -51,22 +51,21 @@ struct SilentCase {
   std::vector<const char*> words;
   std::uint32_t request;
   const char* failure;
-  bool isCalibration;
 };
 
 TEST_F(UdAlsConversation, SilenceAfterEachRequestIsATimeOut) {
   const SilentCase cases[] = {
-      {{"trigger"}, 7800, "ALS TRIGGER request failed", false},
-      {{"autogain", "enable"}, 7802, "Auto gain request failed", false},
-      {{"caldelay", "100", "3", "0", "5", "1"}, 7804, "Delay calibration request failed", true},
-      {{"calgain", "100", "3"}, 7806, "Gain calibration request failed", true},
-      {{"calgain", "ir", "100", "3"}, 7806, "IR Gain calibration request failed", true},
-      {{"pwm", "100", "3", "128"}, 7808, "Display PWM sacling request failed", true},
-      {{"delay", "5"}, 7800, "Set ALS delay request failed", false},
-      {{"gain", "3"}, 7810, "Set gain request failed", false},
-      {{"itime", "100"}, 7812, "Set integration time request failed", false},
-      {{"gain", "3", "itime", "100"}, 7814, "Set gain and integration time request failed", false},
-      {{"itime", "100", "gain", "3"}, 7814, "Set gain and integration time request failed", false},
+      {{"trigger"}, 7800, "ALS TRIGGER request failed"},
+      {{"autogain", "enable"}, 7802, "Auto gain request failed"},
+      {{"caldelay", "100", "3", "0", "5", "1"}, 7804, "Delay calibration request failed"},
+      {{"calgain", "100", "3"}, 7806, "Gain calibration request failed"},
+      {{"calgain", "ir", "100", "3"}, 7806, "IR Gain calibration request failed"},
+      {{"pwm", "100", "3", "128"}, 7808, "Display PWM sacling request failed"},
+      {{"delay", "5"}, 7800, "Set ALS delay request failed"},
+      {{"gain", "3"}, 7810, "Set gain request failed"},
+      {{"itime", "100"}, 7812, "Set integration time request failed"},
+      {{"gain", "3", "itime", "100"}, 7814, "Set gain and integration time request failed"},
+      {{"itime", "100", "gain", "3"}, 7814, "Set gain and integration time request failed"},
   };
   for (const SilentCase& row : cases) {
     staySilent(row.request);
@@ -74,12 +73,8 @@ TEST_F(UdAlsConversation, SilenceAfterEachRequestIsATimeOut) {
     EXPECT_EQ(captured.result, -110) << row.failure;
     EXPECT_EQ(captured.err, std::string("ERROR: ") + row.failure + '\n');
     EXPECT_EQ(elapsed(), Milliseconds(3000)) << row.failure;
-    // What calls itself a calibration closes with its line.
-    if (row.isCalibration) {
-      EXPECT_THAT(captured.out, testing::EndsWith("Calibration failed.\n")) << row.failure;
-    } else {
-      EXPECT_THAT(captured.out, Not(HasSubstr("failed"))) << row.failure;
-    }
+    // No closing line either: nothing has been calibrated yet.
+    EXPECT_THAT(captured.out, Not(HasSubstr("failed"))) << row.failure;
   }
 }
 
