@@ -99,7 +99,8 @@ void QrtrServer::Deliver(ClientId id, qmi::Bytes datagram) {
 }
 
 void QrtrServer::flush() {
-  for (auto& [id, client] : clients_) {
+  for (auto& entry : clients_) {
+    auto& client = entry.second;  // clang 14 captures no structured binding
     if (!client.queue.Flush([this, &client](qmi::Bytes bytes) { return send(client, bytes); })) {
       client.isLost = true;
     }
