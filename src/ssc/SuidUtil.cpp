@@ -16,6 +16,7 @@ int SuidUtil::Lookup(const std::string& dataType, std::vector<SensorUid>* suids)
   sns_suid_event answer;
   const int result =
       exchange_.Run(kSuidLookupSensor, request, [&](const Exchange::Event& event) -> std::optional<int> {
+        if (event.msg_id() == kErrorEvent) return kIoError;
         if (event.msg_id() != kSuidEvent) return std::nullopt;
         if (!answer.ParseFromString(event.payload())) return kMalformed;
         if (answer.data_type() != dataType) return std::nullopt;

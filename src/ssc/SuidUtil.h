@@ -14,7 +14,7 @@ class SuidUtil {
   explicit SuidUtil(Connection* connection) : exchange_(connection) {}
 
   /// Every SUID that publishes `dataType`, in the hub's order. 0; kNotFound when nobody publishes it;
-  /// kTimedOut without an answer; or what sending returned.
+  /// kIoError when the hub answers with an error; kTimedOut without an answer; or what sending returned.
   int Lookup(const std::string& dataType, std::vector<SensorUid>* suids);
 
  private:

@@ -87,6 +87,13 @@ TEST(SuidUtil, AnswerThatDoesNotParseIsMalformed) {
   EXPECT_EQ(lookUp({event(kSuidLookupSensor, 768, "")}).result, ssc::kMalformed);  // no data type
 }
 
+TEST(SuidUtil, AnErrorEndsItAtOnce) {
+  const Lookup lookup = lookUp({event(kSuidLookupSensor, 130, "\x08\x01")});
+  EXPECT_EQ(lookup.result, ssc::kIoError);
+  EXPECT_LT(lookup.end, Clock::TimePoint(1s));
+  EXPECT_EQ(lookup.suids, std::vector<SensorUid>{kOtherSensor});  // as they were
+}
+
 TEST(SuidUtil, AnswersToOtherQuestionsAreIgnored) {
   const Lookup lookup = lookUp({answerTo("accel", {{7, 7}}), event(kSuidLookupSensor, 769, "\xff"),
                                 event(kOtherSensor, 768, suidEvent("pressure", {{8, 8}})),
