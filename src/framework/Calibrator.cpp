@@ -197,7 +197,13 @@ std::vector<std::string> Calibrator::beginCollection() {
   return GetAllConfigRequests();
 }
 
-void Calibrator::endCollection(bool print) {
+void Calibrator::endCollection(int result, bool print) {
+  if (!waited()) {
+    ssc::log(ssc::kLogWarn, "Unable to start the sensors. Error = %d", result);
+    // A response that never came counts as time that has run out. The few readings that came before it, of
+    // sensors not yet settled, must not be taken for the measurement.
+    samples.clear();
+  }
   DisableAllSensors();
   if (print) PrintSamples();
 }

@@ -121,7 +121,7 @@ class Calibrator : public ssc::Client {
   [[nodiscard]] int CollectSamples(const std::chrono::duration<Rep, Period>& period, bool print) {
     const std::vector<std::string> requests = beginCollection();
     const int result = SendRequestsAndWait(requests, period, nullptr);
-    endCollection(print);
+    endCollection(result, print);
     return result;
   }
   /// Whether a collection that runs for a time has come to its end.
@@ -172,7 +172,7 @@ class Calibrator : public ssc::Client {
 
  private:
   std::vector<std::string> beginCollection();
-  void endCollection(bool print);
+  void endCollection(int result, bool print);
   [[nodiscard]] bool endsWait(const ssc::SensorUid& suid, const Event& event);
   [[nodiscard]] bool isShort(const ssc::SensorUid& suid, const sns_std_sensor_event& event);
 

@@ -69,7 +69,8 @@ int Client::sendRequestsAndWaitFor(const std::vector<std::string>& requests, Clo
   connection->RegisterClient(this);
   std::unique_lock<std::mutex> lock(mutex);
   int result = SendRequests(requests, responses);
-  if (result == kOk) {
+  waited_ = result == kOk;
+  if (waited_) {
     result = kTimedOut;
     if (timeout > Clock::Duration::zero()) {
       Clock& clock = connection->clock();

@@ -65,9 +65,15 @@ class Client {
   Condition condition;  ///< notified by a handler that ends the wait
   int status = 0;       ///< guarded by mutex: result of a wait that was ended by a handler
 
+  /// Whether the last episode came to its wait. kTimedOut may also be a request that nobody responded to;
+  /// what events of the other requests left behind then is worth nothing.
+  [[nodiscard]] bool waited() const { return waited_; }
+
  private:
   int sendRequestsAndWaitFor(const std::vector<std::string>& requests, Clock::Duration timeout,
                              std::vector<Response>* responses);
+
+  bool waited_ = false;  ///< the command's thread only
 };
 
 }  // namespace ssc

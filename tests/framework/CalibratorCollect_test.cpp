@@ -194,6 +194,24 @@ TEST_F(CalibratorCollect, ARefusedRequestIsTheResult) {
   EXPECT_EQ(elapsed(), milliseconds(0));
 }
 
+TEST_F(CalibratorCollect, ACollectionThatNeverBeganHasNoSamples) {
+  calibrator->SetSensorInfo(b, "Temperature", 5);
+  script->onRequest = [this](ScriptedHub& hub, const sns_client_request_msg& request) {
+    // Sensor a has begun to stream when sensor b is asked.
+    if (ssc::SensorUid(request.suid()) == b && request.msg_id() == 513) {
+      for (int i = 0; i < 50; ++i) hub.SendReading(milliseconds(0), a, {1});
+    }
+    return false;
+  };
+  script->refuses = [this](const sns_client_request_msg& request) {
+    return ssc::SensorUid(request.suid()) == b && request.msg_id() == 513;
+  };
+  const Captured captured = collect(seconds(1));
+  EXPECT_EQ(captured.result, -5);
+  EXPECT_TRUE(calibrator->samples.empty());
+  EXPECT_EQ(captured.out, "Collecting samples...\nWARN: Unable to start the sensors. Error = -5\n");
+}
+
 TEST_F(CalibratorCollect, TracesItsHandlersAtTheHighestLevel) {
   script->sensors[0].reading = [](int) { return std::vector<float>{1}; };
   ssc::setLogLevel(ssc::kLogVerbose);
