@@ -61,6 +61,7 @@ void Calibrator::HandleEvents(const char* function, const sns_client_event_msg& 
 }
 
 bool Calibrator::endsWait(const ssc::SensorUid& suid, const Event& event) {
+  LogErrorEvent(suid, event);
   if (event.msg_id() != ssc::kSensorEvent) return OnOtherEvent(event);
   if (!event_.ParseFromString(event.payload())) {
     ssc::log(ssc::kLogError, "Received malformed sensor event");
@@ -71,6 +72,14 @@ bool Calibrator::endsWait(const ssc::SensorUid& suid, const Event& event) {
 }
 
 bool Calibrator::OnOtherEvent(const Event& /*event*/) { return false; }
+
+void Calibrator::LogErrorEvent(const ssc::SensorUid& suid, const Event& event) const {
+  sns_std_error_event error;
+  if (event.msg_id() != ssc::kErrorEvent || !error.ParseFromString(event.payload())) return;
+  const auto info = sensorInfo.find(suid);
+  ssc::log(ssc::kLogWarn, "The hub reports error %d of %s", static_cast<int>(error.error()),
+           info == sensorInfo.end() ? "a sensor" : info->second.name.c_str());
+}
 
 bool Calibrator::isShort(const ssc::SensorUid& suid, const sns_std_sensor_event& event) {
   const auto info = sensorInfo.find(suid);
@@ -106,7 +115,11 @@ void Calibrator::OnReconnect() {
       if (status != ssc::kOk) break;
     }
     failed = status != ssc::kOk;
+    if (failed) {
+      ssc::log(ssc::kLogWarn, "Unable to start the sensors after the hub was away. Error = %d", status);
+    }
   } else {
+    ssc::log(ssc::kLogWarn, "The hub went away more than %u times", kToleratedReconnections);
     ssc::log(ssc::kLogDebug, "Exhausted all retries");
     retryCount_ = 0;
     status = ssc::kConnectionLost;

@@ -108,6 +108,9 @@ class Calibrator : public ssc::Client {
   /// OnSensorEvent and OnOtherEvent, and wakes the waiter when one of them, or an event that does not parse,
   /// ends the wait. The rest of the message is then left alone.
   void HandleEvents(const char* function, const sns_client_event_msg& message);
+  /// Mutex held: a level-1 message with the error that the event reports, after which the sensor's readings
+  /// will hardly come; nothing for any other event.
+  void LogErrorEvent(const ssc::SensorUid& suid, const Event& event) const;
   /// Mutex held: takes one event that is no reading of a stream. True ends the wait. Here: ignores it.
   virtual bool OnOtherEvent(const Event& event);
 

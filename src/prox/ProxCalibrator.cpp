@@ -95,6 +95,7 @@ bool ProxCalibrator::takeEvents(const sns_client_event_msg& message) {
   if (!IsFromSensor(message) || hasEnoughSamples()) return false;
   float distance = 0;  // what a near target counts as, until a far event of the same message
   for (const auto& event : message.events()) {
+    LogErrorEvent(ssc::SensorUid(message.suid()), event);
     if (event.msg_id() != kProximityEvent) continue;
     const sns_proximity_event* const reading = ParseReading(event.payload());
     // One that does not parse fails the collection, but does not end it before its time or count.

@@ -58,6 +58,7 @@ void ProximityOffsetCommand::HandleEvents(const char* function, const sns_client
 bool ProximityOffsetCommand::takeEvents(const sns_client_event_msg& message) {
   if (!IsFromSensor(message) || sums_.count >= samplesToCollect_) return false;
   for (const auto& event : message.events()) {
+    LogErrorEvent(ssc::SensorUid(message.suid()), event);
     if (event.msg_id() != kProximityEvent) {
       if (OnAnswer(event.msg_id(), event.payload())) return true;
       continue;

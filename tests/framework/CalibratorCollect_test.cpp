@@ -162,6 +162,17 @@ TEST_F(CalibratorCollect, AMalformedEventEndsItAndTheRestOfItsMessageIsDropped) 
   EXPECT_EQ(elapsed(), milliseconds(30));
 }
 
+TEST_F(CalibratorCollect, AnErrorThatTheHubReportsIsSaidAndEndsNothing) {
+  whenStreamed([&](ScriptedHub& hub) {
+    hub.SendMessage(milliseconds(30), messageOf(a, {{130, "\x08\x07"}, {1025, encodeReading({1})}}));
+    hub.SendMessage(milliseconds(40), messageOf(a, {{130, "\xff"}}));
+  });
+  const Captured captured = collect(seconds(1));
+  EXPECT_EQ(captured.result, kTimedOut);
+  EXPECT_EQ(captured.out, "Collecting samples...\nWARN: The hub reports error 7 of Barometer\n");
+  EXPECT_EQ(calibrator->samples[a].size(), 1U);
+}
+
 TEST_F(CalibratorCollect, AnEventWithoutStatusIsMalformed) {
   whenStreamed([&](ScriptedHub& hub) { hub.SendEvent(milliseconds(1), a, 1025, ""); });
   EXPECT_EQ(collect(seconds(1)).result, kMalformed);
@@ -259,6 +270,7 @@ TEST_F(CalibratorReconnectTooOften, TheFourthTimeEndsIt) {
   EXPECT_EQ(elapsed(), milliseconds(800));
   EXPECT_EQ(captured.out,
             "Collecting samples...\nDEBUG: Retry 1\nDEBUG: Retry 2\nDEBUG: Retry 3\n"
+            "WARN: The hub went away more than 3 times\n"
             "DEBUG: Exhausted all retries\nDEBUG: Retry failed\n");
 }
 
@@ -279,7 +291,9 @@ TEST_F(CalibratorReconnectTooOften, AHubThatRefusesToStreamAgainEndsIt) {
   ssc::setLogLevel(ssc::kLogDebug);
   const Captured captured = collect(seconds(10));
   EXPECT_EQ(captured.result, -5);
-  EXPECT_EQ(captured.out, "Collecting samples...\nDEBUG: Retry 1\nDEBUG: Retry failed\n");
+  EXPECT_EQ(captured.out, "Collecting samples...\nDEBUG: Retry 1\n"
+            "WARN: Unable to start the sensors after the hub was away. Error = -5\n"
+            "DEBUG: Retry failed\n");
 }
 
 TEST_F(CalibratorReconnectTooOften, AHubThatStaysAwayIsATimeOut) {
