@@ -20,6 +20,7 @@
 #include "proto/sns_registry.pb.h"
 #include "proto/sns_std.pb.h"
 #include "ssc/Client.h"
+#include "ssc/RegistryUtil.h"
 
 class Calibrator : public ssc::Client {
  public:
@@ -145,7 +146,14 @@ class Calibrator : public ssc::Client {
 
   /// In a dry run says that nothing is written, and is true.
   [[nodiscard]] bool SkipsWrite() const;
-  enum class WriteFailure { kLogged, kLeftToCaller };
+  enum class WriteFailure {
+    kLogged,
+    kLeftToCaller,  ///< only traced, at level 3
+  };
+  /// Writes the group. 0 or the library's result, logged at level 1 unless left to the caller.
+  [[nodiscard]] static int StoreGroup(ssc::RegistryUtil& registry, const std::string& group,
+                                      const sns_registry_data& data,
+                                      WriteFailure failure = WriteFailure::kLogged);
   /// Says that it writes, and writes the group. 0 or the library's result, logged at level 1 unless left to
   /// the caller.
   [[nodiscard]] int WriteRegistry(const std::string& group, const sns_registry_data& data,

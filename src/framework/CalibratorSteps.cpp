@@ -128,6 +128,16 @@ bool Calibrator::SkipsWrite() const {
   return dryRun;
 }
 
+int Calibrator::StoreGroup(ssc::RegistryUtil& registry, const std::string& group,
+                           const sns_registry_data& data, WriteFailure failure) {
+  const int result = registry.Write(group, data);
+  if (result != ssc::kOk) {
+    ssc::log(failure == WriteFailure::kLogged ? ssc::kLogWarn : ssc::kLogDebug,
+             "Failed to write registry. Error = %d", result);
+  }
+  return result;
+}
+
 int Calibrator::WriteRegistry(const std::string& group, const sns_registry_data& data, WriteFailure failure) {
   return WriteRegistry({{group, &data}}, failure);
 }
@@ -142,12 +152,8 @@ int Calibrator::WriteRegistryGroups(
     const std::vector<std::pair<std::string, const sns_registry_data*>>& groups, WriteFailure failure) {
   ssc::RegistryUtil registry(connection);
   for (const auto& [group, data] : groups) {
-    const int result = registry.Write(group, *data);
-    if (result == ssc::kOk) continue;
-    if (failure == WriteFailure::kLogged) {
-      ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", result);
-    }
-    return result;
+    const int result = StoreGroup(registry, group, *data, failure);
+    if (result != ssc::kOk) return result;
   }
   return ssc::kOk;
 }

@@ -197,7 +197,6 @@ float ImuMultipointCalibrator::positionsTemperature() const {
 }
 
 int ImuMultipointCalibrator::writeGroup(const std::string& group, const sns_registry_data& data) const {
-  const int result = ssc::RegistryUtil(connection).Write(group, data);
-  if (result != ssc::kOk) ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", result);
-  return result;
+  ssc::RegistryUtil registry(connection);
+  return StoreGroup(registry, group, data);
 }

@@ -26,7 +26,7 @@ int ImuMultipointCalibrator::resetAccel() {
   setMatrixItem(kCorrectionMatrix, {1.0F, 1.0F, 1.0F}, &data);
   setVectorItem(kBias, {0.0F, 0.0F, 0.0F}, &data);
   setFloatItem(kMeanTemp, 0.0F, &data);
-  return registry.Write(group, data);
+  return StoreGroup(registry, group, data);
 }
 
 /// Leaves the correction matrix alone, which only some handsets have.
@@ -39,5 +39,5 @@ int ImuMultipointCalibrator::resetGyro() {
   if (result != ssc::kOk) return result;
   setVectorItem(kBias, {0.0F, 0.0F, 0.0F}, &data);
   setFloatItem(kMeanTemp, 0.0F, &data);
-  return registry.Write(group, data);
+  return StoreGroup(registry, group, data);
 }

@@ -127,7 +127,7 @@ int AmbientLightCommand::RestoreDefaults(const std::function<int(sns_registry_da
   if (result != ssc::kOk) return result;
   ssc::say("Resetting ALS calibration...\n");
   result = change(&data);
-  if (result == ssc::kOk) result = registry.Write(GroupName(), data);
+  if (result == ssc::kOk) result = StoreGroup(registry, GroupName(), data);
   if (result != ssc::kOk) return result;
   result = RequestReread();
   if (result != ssc::kOk) ssc::say("Reboot device for default calibration to take effect.\n");

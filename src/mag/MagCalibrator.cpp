@@ -258,11 +258,7 @@ int MagCalibrator::Reset() {
   if (result != ssc::kOk) return result;
   setVectorItem(kBias, {0.0F, 0.0F, 0.0F}, &data);
   if (DeviceHasMagTemp()) setFloatItem(kMeanTemp, 0.0F, &data);
-  result = registry.Write(groupName(), data);
-  if (result == ssc::kOk) {
-    ssc::say("Reboot device for default calibration to take effect.\n");
-  } else {
-    ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", result);
-  }
+  result = StoreGroup(registry, groupName(), data);
+  if (result == ssc::kOk) ssc::say("Reboot device for default calibration to take effect.\n");
   return result;
 }

@@ -162,9 +162,8 @@ int ProxCalibrator::keepApart(float threshold, sns_registry_data* data) {
   if (!displaced) return ssc::kOk;
   ssc::say("Set default threshold with MIN_DIFF\n");
   setFloatItem(other, *displaced, data);
-  const int written = ssc::RegistryUtil(connection).Write(GroupName(), *data);
-  if (written != ssc::kOk) ssc::log(ssc::kLogWarn, "Failed to write registry. Error = %d", written);
-  return written;
+  ssc::RegistryUtil registry(connection);
+  return StoreGroup(registry, GroupName(), *data);
 }
 
 int ProxCalibrator::Reset() {

@@ -92,7 +92,7 @@ std::string ProximityCommand::GroupName() const { return sensorName_ + kGroupSuf
 int ProximityCommand::RequestReread() { return SendRequest(MakeFactoryTestRequest(suid_)); }
 
 int ProximityCommand::StoreDefaults(ssc::RegistryUtil& registry, const sns_registry_data& data) {
-  int result = registry.Write(GroupName(), data);
+  int result = StoreGroup(registry, GroupName(), data);
   if (result != ssc::kOk) return result;
   result = RequestReread();
   if (result != ssc::kOk) ssc::say("Reboot device for default calibration to take effect.\n");

@@ -291,7 +291,8 @@ TEST_F(CalibratorReconnectTooOften, AHubThatRefusesToStreamAgainEndsIt) {
   ssc::setLogLevel(ssc::kLogDebug);
   const Captured captured = collect(seconds(10));
   EXPECT_EQ(captured.result, -5);
-  EXPECT_EQ(captured.out, "Collecting samples...\nDEBUG: Retry 1\n"
+  EXPECT_EQ(captured.out,
+            "Collecting samples...\nDEBUG: Retry 1\n"
             "WARN: Unable to start the sensors after the hub was away. Error = -5\n"
             "DEBUG: Retry failed\n");
 }

@@ -158,6 +158,20 @@ TEST_F(CalibratorSteps, AFailedWriteIsWarnedAboutUnlessLeftToTheCaller) {
   EXPECT_EQ(left.out, "Writing registry...\n");
 }
 
+TEST_F(CalibratorSteps, AGroupIsStoredWithoutAnnouncement) {
+  sns_registry_data data;
+  addFloatItem(&data, "scale", 3, 1);
+  ssc::RegistryUtil registry(connection.get());
+  Captured captured = capture([&] { return PlainCalibrator::StoreGroup(registry, kGroup, data); });
+  EXPECT_EQ(captured.result, 0);
+  EXPECT_EQ(captured.out, "");
+  EXPECT_EQ(script->registry[kGroup].items(0).flt(), 3.0F);
+  script->registryWritesFail = true;
+  captured = capture([&] { return PlainCalibrator::StoreGroup(registry, kGroup, data); });
+  EXPECT_EQ(captured.result, -5);
+  EXPECT_EQ(captured.out, "WARN: Failed to write registry. Error = -5\n");
+}
+
 TEST_F(CalibratorSteps, GroupsThatBelongTogetherAreAnnouncedOnce) {
   sns_registry_data scale;
   addFloatItem(&scale, "x", 3, 1);

@@ -50,6 +50,7 @@ class PlainCalibrator : public Calibrator {
   using Calibrator::sensorInfo;
   using Calibrator::SetSensorInfo;
   using Calibrator::SkipsWrite;
+  using Calibrator::StoreGroup;
   using Calibrator::UnsupportedDevice;
   using Calibrator::UsageError;
   using Calibrator::WriteFailure;
