@@ -1,0 +1,69 @@
+// Every command, in each of its modes that collect or write, against every fault of the hub: whatever goes
+// wrong, it ends in time with the right result, says why, claims no success that is none, and leaves behind
+// only what the next run can use.
+#include <map>
+#include <memory>
+
+#include <gtest/gtest.h>
+
+#include "fault/FaultCell.h"
+#include "fault/ReliabilityPage.h"
+
+namespace fault {
+namespace {
+
+/// The cells of a mode. They are tried once, by whichever test asks first.
+const ModeResults& resultsOf(std::size_t modeIndex) {
+  static std::map<std::size_t, ModeResults> known;
+  const auto found = known.find(modeIndex);
+  if (found != known.end()) return found->second;
+  const ModeUnderTest mode(commandModes()[modeIndex]);
+  ModeResults& results = known[modeIndex];
+  results.good = mode.good();
+  for (const FaultRow& row : faultRows()) results.cells.push_back(mode.Try(row));
+  return results;
+}
+
+class FaultMatrix : public testing::TestWithParam<std::size_t> {};
+
+TEST_P(FaultMatrix, CommandWithstandsEveryFault) {
+  const ModeResults& results = resultsOf(GetParam());
+  EXPECT_EQ(results.good.result, 0);
+  for (const std::string& problem : results.good.problems) ADD_FAILURE() << "on a good hub: " << problem;
+  std::size_t tried = 0;
+  for (std::size_t i = 0; i < faultRows().size(); ++i) {
+    if (!results.cells[i]) continue;
+    ++tried;
+    for (const std::string& problem : results.cells[i]->problems) {
+      ADD_FAILURE() << faultRows()[i].name << ": " << problem;
+    }
+  }
+  EXPECT_GE(tried, 10U) << "a command that hardly a fault can happen to is not tried at all";
+}
+
+std::string nameOf(const testing::TestParamInfo<std::size_t>& info) {
+  std::string name;
+  bool capital = true;
+  for (const char c : commandModes()[info.param].title()) {
+    if (c < '0' || c > 'z' || (c > '9' && c < 'A')) {
+      capital = true;
+      continue;
+    }
+    name += capital ? static_cast<char>(std::toupper(c)) : c;
+    capital = false;
+  }
+  return name;
+}
+
+INSTANTIATE_TEST_SUITE_P(Commands, FaultMatrix, testing::Range(std::size_t{0}, commandModes().size()),
+                         nameOf);
+
+TEST(FaultMatrixPage, ShowsWhatTheCommandsDo) {
+  std::vector<ModeResults> all;
+  for (std::size_t i = 0; i < commandModes().size(); ++i) all.push_back(resultsOf(i));
+  EXPECT_GE(countCells(all), 600U);
+  EXPECT_EQ(pageWithMatrix(VANTLE_RELIABILITY_PAGE, all), "");
+}
+
+}  // namespace
+}  // namespace fault
