@@ -1,6 +1,7 @@
 #include "fault/CommandModes.h"
 
 #include <array>
+#include <cctype>
 #include <utility>
 
 namespace fault {
@@ -371,6 +372,17 @@ const std::vector<CommandMode>& commandModes() {
     return all;
   }();
   return modes;
+}
+
+std::string testNameOf(const std::string& title) {
+  std::string name;
+  bool begins = true;
+  for (const char c : title) {
+    const auto byte = static_cast<unsigned char>(c);
+    if (std::isalnum(byte) != 0) name += begins ? static_cast<char>(std::toupper(byte)) : c;
+    begins = std::isalnum(byte) == 0;
+  }
+  return name;
 }
 
 }  // namespace fault

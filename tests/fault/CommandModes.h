@@ -50,4 +50,7 @@ struct CommandMode {
 
 [[nodiscard]] const std::vector<CommandMode>& commandModes();
 
+/// The title as the name of a test: "imu-multipoint last phase" is "ImuMultipointLastPhase".
+[[nodiscard]] std::string testNameOf(const std::string& title);
+
 }  // namespace fault

@@ -2,14 +2,10 @@
 
 #include <csignal>
 #include <cstring>
-#include <system_error>
 
 #include <unistd.h>
 
-#include "imu/ImuMultipointFile.h"
-#include "proto/sns_registry.pb.h"
-#include "simhub/RegistryJson.h"
-#include "ssc/RegistryUtil.h"
+#include "fault/HandsetFiles.h"
 
 namespace fault {
 namespace {
@@ -19,8 +15,6 @@ constexpr double kPatience_s = 10;
 /// Real time after which a cell counts as hung. A cell takes milliseconds, some tens of them with a
 /// sanitizer.
 constexpr unsigned kHang_s = 60;
-
-constexpr const char* kMultipointFile = "data/app-ephemeral/vantle_imu";
 
 char runningCell[256];
 
@@ -52,53 +46,12 @@ std::string shown(const Captured& captured) {
   return "\n--- standard output\n" + captured.out + "--- standard error\n" + captured.err;
 }
 
-void copyFolder(const std::filesystem::path& from, const std::filesystem::path& to) {
-  std::filesystem::copy(
-      from, to, std::filesystem::copy_options::recursive | std::filesystem::copy_options::overwrite_existing);
-}
-
-std::map<std::string, std::string> registryFiles(const std::filesystem::path& root) {
-  std::map<std::string, std::string> files;
-  std::error_code ignored;
-  for (const auto& entry :
-       std::filesystem::directory_iterator((root.string() + ssc::RegistryUtil::RegistryPath()), ignored)) {
-    files[entry.path().filename()] = support::readFile(entry.path()).value_or("");
-  }
-  return files;
-}
-
-/// The names of the group's items, if it is one.
-std::optional<std::string> itemNames(const std::string& file) {
-  sns_registry_data items;
-  std::string error;
-  if (!simhub::parseRegistryGroup(file, &items, &error)) return std::nullopt;
-  std::string names;
-  for (const sns_registry_data_item& item : items.items()) names += item.name() + " ";
-  return names;
-}
-
-/// What is wrong with the file between the steps of a multi-point calibration.
-std::string faultOfMultipointFile(const std::filesystem::path& path, const std::string& content) {
-  std::vector<ImuPosition> positions;
-  if (readPositions(path, &positions) == FileResult::kOk) return "";
-  std::vector<ImuCalibrationInfo> records;
-  if (readCalibrationInfos(path, &records) != FileResult::kOk) return "cannot be read";
-  if (content.back() != '\n') return "ends in the middle of a record";
-  for (const ImuCalibrationInfo& record : records) {
-    if (record.phase.empty() || !record.IsFinite()) return "holds a record that is none";
-  }
-  return "";
-}
-
 }  // namespace
 
 ModeUnderTest::ModeUnderTest(const CommandMode& mode) : mode_(mode) {
   const HangGuard guard(mode_.title());
-  support::makeDeviceFolders(ready_.path());
-  for (const CommandMode::Step& step : mode_.before) {
-    const WatchedRun before = runWatched(ready_.path(), mode_.device, step.words, step.world, mode_.lookedUp);
-    if (before.captured.result != 0) good_.problems.push_back("a step before fails" + shown(before.captured));
-  }
+  const std::string unready = prepareHandset(mode_, ready_.path());
+  if (!unready.empty()) good_.problems.push_back(unready);
   copyFolder(ready_.path(), calibrated_.path());
   const WatchedRun whole = run(calibrated_.path(), {});
   traffic_ = whole.traffic;
@@ -136,7 +89,8 @@ std::optional<FaultCell> ModeUnderTest::Try(const FaultRow& row) const {
   checkOutput(faulty, row.expected(mode_), &cell);
   checkTime(faulty, &cell);
   checkRegistry(before, registryFiles(root.path()), cell.result == 0 ? Stored::kPerhaps : row.stored, &cell);
-  checkWorkingFiles(start, root.path(), &cell);
+  const std::string lost = faultOfWorkingFiles(start, root.path());
+  if (!lost.empty()) cell.problems.push_back(lost);
   if (cell.result != 0) checkRecovery(root.path(), &cell);
   return cell;
 }
@@ -193,18 +147,6 @@ void ModeUnderTest::checkRegistry(const Files& before, const Files& after, Store
       cell->problems.push_back("registry file " + name + " is not whole:\n" + content);
     }
   }
-}
-
-void ModeUnderTest::checkWorkingFiles(const std::filesystem::path& before, const std::filesystem::path& after,
-                                      FaultCell* cell) const {
-  const auto old = support::readFile(before / kMultipointFile);
-  const auto now = support::readFile(after / kMultipointFile);
-  if (old && (!now || now->compare(0, old->size(), *old) != 0)) {
-    cell->problems.emplace_back("records of earlier steps are gone");
-  }
-  if (!now || now->empty()) return;
-  const std::string fault = faultOfMultipointFile(after / kMultipointFile, *now);
-  if (!fault.empty()) cell->problems.push_back("the file of earlier steps " + fault);
 }
 
 void ModeUnderTest::checkRecovery(const std::filesystem::path& root, FaultCell* cell) const {

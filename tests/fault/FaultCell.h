@@ -1,14 +1,13 @@
 // One cell of the fault matrix: a command in one of its modes, one fault, and what came of it.
 #pragma once
 
-#include <map>
-#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "fault/CommandModes.h"
 #include "fault/FaultRows.h"
+#include "fault/HandsetFiles.h"
 #include "fault/WatchedRun.h"
 #include "support/TemporaryFolder.h"
 
@@ -31,15 +30,11 @@ class ModeUnderTest {
   [[nodiscard]] std::optional<FaultCell> Try(const FaultRow& row) const;
 
  private:
-  using Files = std::map<std::string, std::string>;
-
   [[nodiscard]] WatchedRun run(const std::filesystem::path& root,
                                const std::vector<std::string>& overrides) const;
   void checkOutput(const WatchedRun& run, const Expected& expected, FaultCell* cell) const;
   void checkTime(const WatchedRun& run, FaultCell* cell) const;
   void checkRegistry(const Files& before, const Files& after, Stored stored, FaultCell* cell) const;
-  void checkWorkingFiles(const std::filesystem::path& before, const std::filesystem::path& after,
-                         FaultCell* cell) const;
   /// The command has to succeed on what the fault has left behind.
   void checkRecovery(const std::filesystem::path& root, FaultCell* cell) const;
 

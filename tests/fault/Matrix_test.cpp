@@ -41,22 +41,12 @@ TEST_P(FaultMatrix, CommandWithstandsEveryFault) {
   EXPECT_GE(tried, 10U) << "a command that hardly a fault can happen to is not tried at all";
 }
 
-std::string nameOf(const testing::TestParamInfo<std::size_t>& info) {
-  std::string name;
-  bool capital = true;
-  for (const char c : commandModes()[info.param].title()) {
-    if (c < '0' || c > 'z' || (c > '9' && c < 'A')) {
-      capital = true;
-      continue;
-    }
-    name += capital ? static_cast<char>(std::toupper(c)) : c;
-    capital = false;
-  }
-  return name;
+std::string testName(const testing::TestParamInfo<std::size_t>& mode) {
+  return testNameOf(commandModes()[mode.param].title());
 }
 
 INSTANTIATE_TEST_SUITE_P(Commands, FaultMatrix, testing::Range(std::size_t{0}, commandModes().size()),
-                         nameOf);
+                         testName);
 
 TEST(FaultMatrixPage, ShowsWhatTheCommandsDo) {
   std::vector<ModeResults> all;
