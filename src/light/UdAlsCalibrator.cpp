@@ -296,7 +296,8 @@ int UdAlsCalibrator::runLux() {
   result = makeScaleNeutral();
   if (result != ssc::kOk) return result;
   // The records so far were scaled by what the registry held: only those of the neutral scale count.
-  removeDataFile();
+  result = removeDataFile();
+  if (result != ssc::kOk) return Conclude("Calibration", result);
   startLog(kUdAlsLuxLog, kUdAlsLogHeader);
   result = CollectData(kUdAlsLuxLog);
   return result == ssc::kOk ? CalibrateLux() : result;

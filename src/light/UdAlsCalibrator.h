@@ -90,7 +90,8 @@ class UdAlsCalibrator final : public AmbientLightCommand {
                                 int (UdAlsCalibrator::*log)(const char*, const SampleData&));
   [[nodiscard]] int appendRecord(const SampleData& means);
   void printMeans(const SampleData& means) const;
-  static void removeDataFile();
+  /// 0, also where there is no file, or kNotPermitted after a level-0 message.
+  [[nodiscard]] static int removeDataFile();
   static void startLog(const char* path, const char* header);
   /// The delay of the step: of the TE2 signal while that is scanned.
   [[nodiscard]] float delayOfStep() const;

@@ -63,9 +63,10 @@ int UdAlsCalibrator::runDelayScan() {
   const bool isTe2 = words_.mode == UdAlsMode::kTe2DelayCalibration;
   ssc::say(isTe2 ? "Delay calibration by scanning TE2...\n" : "Delay calibration...\n");
   ssc::say("Removing data file...\n");
-  removeDataFile();
+  int result = removeDataFile();
+  if (result != ssc::kOk) return Conclude("Calibration", result);
   startLog(isTe2 ? kUdAlsTe2DelayLog : kUdAlsDelayLog, kUdAlsDelayLogHeader);
-  const int result = isTe2 ? scanTe2Delays() : scanDelays();
+  result = isTe2 ? scanTe2Delays() : scanDelays();
   return result == ssc::kOk ? DelayCalibrate() : result;
 }
 

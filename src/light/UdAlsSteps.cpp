@@ -165,10 +165,12 @@ int UdAlsCalibrator::LoadData(std::vector<SampleData>* records) {
   return ssc::kShortFile;
 }
 
-void UdAlsCalibrator::removeDataFile() {
+int UdAlsCalibrator::removeDataFile() {
   const int result = ssc::removeWorkingFile(ssc::devicePath(kUdAlsDataFile));
-  if (result == ssc::kOk) return;
-  ssc::log(ssc::kLogWarn, "Unable to remove the data file: %s", std::strerror(-result));
+  if (result == ssc::kOk) return result;
+  // The old records would be solved together with the new ones.
+  ssc::log(ssc::kLogError, "Unable to remove the data file: %s", std::strerror(-result));
+  return ssc::kNotPermitted;
 }
 
 void UdAlsCalibrator::startLog(const char* path, const char* header) {

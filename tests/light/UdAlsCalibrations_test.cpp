@@ -28,6 +28,15 @@ TEST_F(UdAlsCalibrations, AScanAddsInSinglePrecision) {
   for (std::size_t i = 0; i < wanted.size(); ++i) EXPECT_EQ(records()[i][kUdAlsDelay], wanted[i]);
 }
 
+TEST_F(UdAlsCalibrations, AScanDoesNotBeginWithOldRecordsThatCannotBeRemoved) {
+  std::filesystem::create_directories(folder.path() / kDataFile / "occupied");
+  const Captured captured = run({"caldelay", "100", "3", "0", "5", "1"});
+  EXPECT_EQ(captured.result, -1);
+  EXPECT_THAT(captured.err, HasSubstr("ERROR: Unable to remove the data file: "));
+  EXPECT_THAT(captured.out, EndsWith("Calibration failed.\n"));
+  EXPECT_EQ(script->countRequests(light, kStream), 0);
+}
+
 TEST_F(UdAlsCalibrations, AScanWhoseStartLiesBeyondItsEndComputesFromNothing) {
   giveRecords({makeUdAlsRecord({})});
   const Captured captured = run({"caldelay", "100", "3", "5", "4", "1"});
