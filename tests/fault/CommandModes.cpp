@@ -1,8 +1,8 @@
-#include "fault/CommandModes.h"
-
 #include <array>
 #include <cctype>
 #include <utility>
+
+#include "fault/ModeTables.h"
 
 namespace fault {
 namespace {
@@ -270,6 +270,7 @@ void addPositional(CommandMode mode, std::vector<CommandMode>* modes) {
   modes->push_back(mode);
 
   mode.name = "reset";
+  mode.keepsRecords = false;
   mode.words = {"-r", "imu-multipoint"};
   mode.world = {};
   mode.before = {};
@@ -322,6 +323,7 @@ void addImuMultipoint(std::vector<CommandMode>* modes) {
   mode.family = "imu-multipoint";
   mode.lookedUp = mode.streamed = "accel";
   mode.ending = Ending::kTime;
+  mode.keepsRecords = true;
   mode.begins = "uing IMU multi-point calibration";
   mode.closes = "IMU multi-point calibration";
   addPositional(mode, modes);
@@ -363,7 +365,12 @@ const std::vector<CommandMode>& commandModes() {
   static const std::vector<CommandMode> modes = [] {
     std::vector<CommandMode> all;
     addAls(&all);
+    addUnderDisplayLightModes(&all);
+    addColorModes(&all);
     addProx(&all);
+    addProximityOffsetModes(&all);
+    addUnderDisplayProximityModes(&all);
+    addSarModes(&all);
     addBaro(&all);
     addMag(&all);
     addMagConfiguration(&all);

@@ -2,6 +2,7 @@
 // command, or a new mode of one, is a row of commandModes().
 #pragma once
 
+#include <cstdint>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -34,6 +35,8 @@ struct CommandMode {
   Ending ending = Ending::kNoSamples;
   Notice notice = Notice::kNone;
   bool storesInRegistry = false;
+  bool keepsRecords = false;     ///< adds to a file between its steps
+  std::uint32_t ownRequest = 0;  ///< message id of a request that only this kind of sensor takes; 0: none
 
   std::string begins;  ///< printed when the closing line is due from then on; empty: there is none
   std::string closes;  ///< the closing line without its verdict

@@ -44,9 +44,20 @@ std::string fromKey(double seconds) { return "from=" + std::to_string(seconds); 
 /// Readings that do not come, or do not count.
 Expected lost(const CommandMode& mode, std::size_t moment) {
   if (moment == kAfter) return {};
-  if (counts(mode)) return {ssc::kTimedOut, "Timed out waiting for"};
+  if (counts(mode)) return {ssc::kTimedOut, mode.family == "color" ? "" : "Timed out waiting for"};
   if (moment == kMiddle) return {};
   return {ssc::kNoData, ""};
+}
+
+bool measuresOffsets(const CommandMode& mode) {
+  return mode.family == "prox with offset" || mode.family == "prox under the display";
+}
+
+/// A collection that ends otherwise than by its time.
+Expected collectionFails(const CommandMode& mode, int result, const std::string& says) {
+  // Stores 0 then, and calls that success: production lines rely on it.
+  if (mode.Is("prox under the display pulse number")) return {};
+  return {result, says};
 }
 
 using ReadingExpectation = Expected (*)(const CommandMode& mode, std::size_t moment);
@@ -64,20 +75,31 @@ void addReadingRows(std::vector<FaultRow>* rows) {
        [](const CommandMode& mode, std::size_t moment) {
          return mode.family == "baro" ? Expected{} : lost(mode, moment);
        }},
-      {"short_event", {"values=0"}, lost},
+      {"short_event",
+       {"values=0"},
+       [](const CommandMode& mode, std::size_t moment) {
+         const bool isMalformed = measuresOffsets(mode) && moment != kAfter;
+         return isMalformed ? collectionFails(mode, ssc::kMalformed, "Received malformed")
+                            : lost(mode, moment);
+       }},
       {"extra_values", {"values=3"}, [](const CommandMode&, std::size_t) { return Expected{}; }},
       {"nan",
        {},
        [](const CommandMode& mode, std::size_t moment) {
-         if (moment == kAfter || mode.family == "prox") return Expected{};
-         return Expected{ssc::kInvalid, ""};
+         // Proximity's counts are whole numbers, 0 instead of none; only its offsets are not.
+         if (moment == kAfter || mode.family == "prox" || mode.family == "prox with offset")
+           return Expected{};
+         if (mode.Is("prox under the display pulse number") && moment == kMiddle) return Expected{};
+         // Without an infrared that is a number a reading of colors does not count.
+         return mode.family == "color" ? lost(mode, moment) : Expected{ssc::kInvalid, ""};
        }},
       {"malformed",
        {},
        [](const CommandMode& mode, std::size_t moment) {
          if (moment == kAfter) return Expected{};
          // A proximity event that does not parse fails the collection, but does not end it.
-         return Expected{mode.family == "prox" ? ssc::kTimedOut : ssc::kMalformed, "Received malformed"};
+         return mode.family == "prox" ? Expected{ssc::kTimedOut, "Received malformed"}
+                                      : collectionFails(mode, ssc::kMalformed, "Received malformed");
        }},
       {"wrong_id", {}, lost},
       {"duplicate", {}, [](const CommandMode&, std::size_t) { return Expected{}; }},
@@ -89,7 +111,7 @@ void addReadingRows(std::vector<FaultRow>* rows) {
       row.family = "Readings";
       row.name = std::string(kind.fault) + ", " + kMoments[moment].name;
       row.overrides = [kind, moment](const CommandMode& mode, const Traffic& good) -> Made {
-        if (good.readings.empty()) return std::nullopt;
+        if (mode.streamed.empty() || good.readings.empty()) return std::nullopt;
         std::vector<std::string> keys = kind.keys;
         keys.push_back("sensor=" + mode.streamed);
         keys.push_back(fromKey(kMoments[moment].from(good.readings)));
@@ -128,6 +150,11 @@ int resultOf(Failure failure) { return failure == Failure::kUnanswered ? ssc::kT
 
 Expected lookUpFails(const CommandMode&, Failure failure) { return {resultOf(failure), "Unable to"}; }
 
+Expected attributesFail(const CommandMode& mode, Failure failure) {
+  // A SAR sensor that does not say which one it is cannot be the one wanted.
+  return {mode.family == "sar" ? ssc::kNotFound : resultOf(failure), "Unable to"};
+}
+
 /// The hub answers a read with an error for the one reason that there is no such group.
 Expected readFails(const CommandMode&, Failure failure) {
   return {failure == Failure::kError ? ssc::kNotFound : resultOf(failure), "Unable to read registry group"};
@@ -137,8 +164,9 @@ Expected readFails(const CommandMode&, Failure failure) {
 /// answers with an error is a silent one.
 Expected startFails(const CommandMode& mode, Failure failure) {
   if (failure == Failure::kError) return {lost(mode, kFirst).result, "The hub reports error"};
-  const int result = failure == Failure::kRefused ? ssc::kIoError : lost(mode, kFirst).result;
-  return {result, "Unable to start the sensors"};
+  if (failure == Failure::kRefused)
+    return collectionFails(mode, ssc::kIoError, "Unable to start the sensors");
+  return {lost(mode, kFirst).result, "Unable to start the sensors"};
 }
 
 Expected stopFails(const CommandMode&, Failure) { return {}; }
@@ -158,10 +186,18 @@ Expected testFails(const CommandMode& mode, Failure failure) {
   return {resultOf(failure), mode.begins.empty() ? "Reboot device" : "may require reboot"};
 }
 
+Expected ownRequestFails(const CommandMode&, Failure failure) {
+  // An error instead of an answer: nobody answers.
+  return {failure == Failure::kRefused ? ssc::kIoError : ssc::kTimedOut, ""};
+}
+
+/// In place of the id of a request that each kind of sensor has its own of.
+constexpr std::uint32_t kOwnRequest = 0;
+
 const std::vector<Request>& requests() {
   static const std::vector<Request> all{
       {"look-up of the sensor", lookUp, ssc::kSuidRequest, 0, Stored::kNothing, lookUpFails},
-      {"the sensor's attributes", lookedUp, ssc::kAttributesRequest, 0, Stored::kNothing, lookUpFails},
+      {"the sensor's attributes", lookedUp, ssc::kAttributesRequest, 0, Stored::kNothing, attributesFail},
       {"reading the registry", registry, ssc::kRegistryReadRequest, 0, Stored::kNothing, readFails},
       {"starting the sensor", streamed, ssc::kStreamConfigRequest, 0, Stored::kNothing, startFails},
       {"stopping the sensor", streamed, ssc::kDisableRequest, 0, Stored::kNothing, stopFails},
@@ -169,6 +205,7 @@ const std::vector<Request>& requests() {
       {"writing it a second time", registry, ssc::kRegistryWriteRequest, 1, Stored::kPerhaps, writeFails},
       {"telling the sensor", streamed, ssc::kCalibrationChangedRequest, 0, Stored::kPerhaps, noticeFails},
       {"the factory test", lookedUp, ssc::kTestRequest, 0, Stored::kPerhaps, testFails},
+      {"its own request", lookedUp, kOwnRequest, 0, Stored::kNothing, ownRequestFails},
   };
   return all;
 }
@@ -194,12 +231,11 @@ void addRequestRows(std::vector<FaultRow>* rows) {
       row.name = std::string(request.name) + ": " + kind.name;
       row.overrides = [request, kind](const CommandMode& mode, const Traffic& good) -> Made {
         const std::string addressee = request.addressee(mode);
-        if (addressee.empty() || good.CountRequests(addressee, request.message) <= request.after) {
-          return std::nullopt;
-        }
+        const std::uint32_t message = request.message == kOwnRequest ? mode.ownRequest : request.message;
+        if (addressee.empty() || good.CountRequests(addressee, message) <= request.after) return std::nullopt;
         std::vector<std::string> keys = kind.keys;
         keys.push_back("sensor=" + addressee);
-        keys.push_back("message=" + std::to_string(request.message));
+        keys.push_back("message=" + std::to_string(message));
         keys.push_back("after=" + std::to_string(request.after));
         return faultOf(kind.fault, keys);
       };
@@ -228,6 +264,21 @@ void addAnswerRows(std::vector<FaultRow>* rows) {
                    [](const CommandMode&) {
                      return Expected{ssc::kNotFound, "registry"};
                    }});
+  const auto ownRequestFault = [](const char* fault) {
+    return [fault](const CommandMode& mode, const Traffic&) -> Made {
+      if (mode.ownRequest == 0) return std::nullopt;
+      return faultOf(fault, {"sensor=" + mode.lookedUp, "message=" + std::to_string(mode.ownRequest)});
+    };
+  };
+  rows->push_back(
+      {"Requests", "its own request is answered with a failure", ownRequestFault("oem_failure"),
+       [](const CommandMode& mode) {
+         return mode.family == "sar" ? Expected{ssc::kMalformed, "malformed"} : Expected{ssc::kOk, "ERROR: "};
+       }});
+  rows->push_back(
+      {"Requests", "its own request is not answered", ownRequestFault("oem_silence"), [](const CommandMode&) {
+         return Expected{ssc::kTimedOut, "ERROR: "};
+       }});
   rows->push_back({"Requests", "the sensor does not confirm",
                    [](const CommandMode& mode, const Traffic& good) -> Made {
                      if (good.CountRequests(mode.streamed, ssc::kCalibrationChangedRequest) == 0)
@@ -270,7 +321,8 @@ Expected groupUnwritable(const CommandMode& mode) { return writeFails(mode, Fail
 /// Only some need to know what was stored before.
 Expected itemOfAnotherKind(const CommandMode& mode) {
   // Light and proximity take it for 0, the phases' result and a reset replace it: that is how it is repaired.
-  const bool isReplaced = counts(mode) || mode.name == "reset" || mode.Is("imu-multipoint last phase");
+  const bool isReplaced =
+      counts(mode) || mode.family == "sar" || mode.name == "reset" || mode.Is("imu-multipoint last phase");
   return isReplaced ? Expected{} : Expected{ssc::kInvalid, "Invalid registry"};
 }
 
@@ -304,22 +356,24 @@ void addHubRow(const std::string& name, Made (*overrides)(const CommandMode&, co
   rows->push_back({"Hub", name, overrides, expected});
 }
 
-Made awayFrom(std::size_t moment, const Traffic& good, std::vector<std::string> keys) {
-  if (good.readings.empty()) return std::nullopt;
+Made awayFrom(const CommandMode& mode, std::size_t moment, const Traffic& good,
+              std::vector<std::string> keys) {
+  if (mode.streamed.empty() || good.readings.empty()) return std::nullopt;
   const double from = moment == kFirst ? good.readings.front() - 1e-4 : kMoments[moment].from(good.readings);
   keys.push_back(fromKey(from));
   return faultOf("hub_away", keys);
 }
 
 Made awayTimes(const CommandMode& mode, const Traffic& good, const char* times) {
-  if (good.readings.size() < 5) return std::nullopt;
+  if (mode.streamed.empty() || good.readings.size() < 5) return std::nullopt;
   return faultOf("hub_away",
                  {"sensor=" + mode.streamed, "after=1", "down_for=0.05", std::string("times=") + times});
 }
 
 /// Whatever comes after the collection cannot be sent.
 Expected cutOff(const CommandMode& mode, int result) {
-  const bool asksOn = mode.storesInRegistry || mode.family == "imu-thermal";  // which reads the registry late
+  // These read the registry after the collection.
+  const bool asksOn = mode.storesInRegistry || mode.family == "imu-thermal" || mode.Is("color verify");
   if (!asksOn) return {};
   if (mode.Is("als calibrate")) return {result, "", Reason::kUnsaid};
   return {result, ""};
@@ -336,23 +390,28 @@ void addHubRows(std::vector<FaultRow>* rows) {
       rows);
   addHubRow(
       "goes before the first reading, for good",
-      [](const CommandMode&, const Traffic& good) { return awayFrom(kFirst, good, {}); },
+      [](const CommandMode& mode, const Traffic& good) { return awayFrom(mode, kFirst, good, {}); },
       [](const CommandMode& mode) { return lost(mode, kFirst); }, rows);
   addHubRow(
       "goes in the middle, for good",
-      [](const CommandMode&, const Traffic& good) { return awayFrom(kMiddle, good, {}); },
+      [](const CommandMode& mode, const Traffic& good) { return awayFrom(mode, kMiddle, good, {}); },
       [](const CommandMode& mode) { return counts(mode) ? lost(mode, kMiddle) : gone(mode); }, rows);
   addHubRow(
       "goes after the last reading, for good",
-      [](const CommandMode&, const Traffic& good) { return awayFrom(kAfter, good, {}); }, gone, rows);
+      [](const CommandMode& mode, const Traffic& good) { return awayFrom(mode, kAfter, good, {}); }, gone,
+      rows);
   rows->back().stored = Stored::kPerhaps;  // a command that counts its samples is storing by then
   addHubRow(
       "goes before the first reading, back after 0.1 s",
-      [](const CommandMode&, const Traffic& good) { return awayFrom(kFirst, good, {"down_for=0.1"}); },
+      [](const CommandMode& mode, const Traffic& good) {
+        return awayFrom(mode, kFirst, good, {"down_for=0.1"});
+      },
       succeeds, rows);
   addHubRow(
       "goes in the middle, back after 0.1 s",
-      [](const CommandMode&, const Traffic& good) { return awayFrom(kMiddle, good, {"down_for=0.1"}); },
+      [](const CommandMode& mode, const Traffic& good) {
+        return awayFrom(mode, kMiddle, good, {"down_for=0.1"});
+      },
       succeeds, rows);
   addHubRow(
       "goes three times",
@@ -361,14 +420,14 @@ void addHubRows(std::vector<FaultRow>* rows) {
   addHubRow(
       "goes four times",
       [](const CommandMode& mode, const Traffic& good) { return awayTimes(mode, good, "4"); },
-      [](const CommandMode&) {
-        return Expected{ssc::kConnectionLost, ""};
+      [](const CommandMode& mode) {
+        return collectionFails(mode, ssc::kConnectionLost, "The hub went away");
       },
       rows);
   addHubRow(
       "falls silent in the middle",
-      [](const CommandMode&, const Traffic& good) -> Made {
-        if (good.readings.empty()) return std::nullopt;
+      [](const CommandMode& mode, const Traffic& good) -> Made {
+        if (mode.streamed.empty() || good.readings.empty()) return std::nullopt;
         const std::string from = fromKey(kMoments[kMiddle].from(good.readings));
         return Overrides{"fault.a.kind=no_response", "fault.a." + from, "fault.b.kind=silent",
                          "fault.b." + from};

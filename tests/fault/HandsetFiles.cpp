@@ -5,6 +5,8 @@
 
 #include "fault/WatchedRun.h"
 #include "imu/ImuMultipointFile.h"
+#include "light/ColorRecord.h"
+#include "light/UdAlsFiles.h"
 #include "proto/sns_registry.pb.h"
 #include "simhub/RegistryFiles.h"
 #include "simhub/RegistryJson.h"
@@ -14,8 +16,6 @@
 
 namespace fault {
 namespace {
-
-constexpr const char* kMultipointFile = "data/app-ephemeral/vantle_imu";
 
 std::string registryFolder(const std::filesystem::path& root) {
   return root.string() + ssc::RegistryUtil::RegistryPath();
@@ -33,6 +33,34 @@ std::string faultOfMultipointFile(const std::filesystem::path& path, const std::
   }
   return "";
 }
+
+std::string faultOfColorRecords(const std::filesystem::path&, const std::string& content) {
+  constexpr std::size_t kRecord = color_record::kCount * sizeof(float);
+  return content.size() % kRecord == 0 ? "" : "ends in the middle of a record";
+}
+
+std::string faultOfLightRecords(const std::filesystem::path& path, const std::string&) {
+  std::vector<SampleData> records;
+  return readUdAlsRecords(path, &records) == FileResult::kOk ? "" : "cannot be read to its end";
+}
+
+std::string faultOfLines(const std::filesystem::path&, const std::string& content) {
+  return content.back() == '\n' ? "" : "ends in the middle of a line";
+}
+
+/// A file that outlives a step, below the handset's root.
+struct WorkingFile {
+  const char* path;
+  bool onlyGrows;  ///< commands that start it anew are not tried here
+  std::string (*faultOf)(const std::filesystem::path& path, const std::string& content);
+};
+constexpr WorkingFile kWorkingFiles[] = {
+    {"data/app-ephemeral/vantle_imu", true, faultOfMultipointFile},
+    {"data/app-ephemeral/vantle_color", true, faultOfColorRecords},
+    {"data/app-ephemeral/vantle_als", true, faultOfLightRecords},
+    {"mnt/vendor/persist/sensors/color.csv", true, faultOfLines},
+    {"persist/sensors/als.csv", false, faultOfLines},
+};
 
 }  // namespace
 
@@ -67,12 +95,17 @@ std::optional<std::string> itemNames(const std::string& file) {
 }
 
 std::string faultOfWorkingFiles(const std::filesystem::path& before, const std::filesystem::path& after) {
-  const auto old = support::readFile(before / kMultipointFile);
-  const auto now = support::readFile(after / kMultipointFile);
-  if (old && (!now || now->compare(0, old->size(), *old) != 0)) return "records of earlier steps are gone";
-  if (!now || now->empty()) return "";
-  const std::string fault = faultOfMultipointFile(after / kMultipointFile, *now);
-  return fault.empty() ? "" : "the file of earlier steps " + fault;
+  for (const WorkingFile& file : kWorkingFiles) {
+    const auto old = support::readFile(before / file.path);
+    const auto now = support::readFile(after / file.path);
+    if (file.onlyGrows && old && (!now || now->compare(0, old->size(), *old) != 0)) {
+      return std::string(file.path) + ": records of earlier steps are gone";
+    }
+    if (!now || now->empty()) continue;
+    const std::string fault = file.faultOf(after / file.path, *now);
+    if (!fault.empty()) return std::string(file.path) + " " + fault;
+  }
+  return "";
 }
 
 std::string prepareHandset(const CommandMode& mode, const std::filesystem::path& root) {
