@@ -7,6 +7,7 @@
 
 #include "framework/Calibrator.h"
 #include "framework/Notifier.h"
+#include "framework/Statistics.h"
 #include "ssc/Log.h"
 #include "ssc/RegistryUtil.h"
 
@@ -119,7 +120,7 @@ int Calibrator::RequireFinite(const char* what, const std::vector<float>& values
   const auto odd =
       std::find_if(values.begin(), values.end(), [](float value) { return !std::isfinite(value); });
   if (odd == values.end()) return ssc::kOk;
-  ssc::log(ssc::kLogError, "%s is not a finite number: %f", what, static_cast<double>(*odd));
+  ssc::log(ssc::kLogError, "%s is not a finite number: %f", what, static_cast<double>(withPlainNan(*odd)));
   return ssc::kInvalid;
 }
 

@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <array>
+#include <cmath>
 #include <cstdio>
+#include <limits>
 
 namespace {
 
@@ -11,6 +13,8 @@ constexpr std::size_t kUsualFieldLength = 64;
 constexpr int kDefaultPrecision = 6;
 
 void appendFixed(std::string* text, int width, int precision, float value) {
+  // 0/0 is a negative not-a-number on x86 and a positive one on the handset: both are printed as the latter.
+  if (std::isnan(value)) value = std::numeric_limits<float>::quiet_NaN();
   std::array<char, kUsualFieldLength> field;
   const int length =
       std::snprintf(field.data(), field.size(), " %*.*f", width, precision, static_cast<double>(value));

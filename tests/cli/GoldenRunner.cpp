@@ -57,24 +57,6 @@ void setVariable(const std::string& name, const std::optional<std::string>& valu
   if (value) command->environment.emplace_back(name, *value);
 }
 
-/// The cases are written on a processor on which a sum that has no result is "-nan"; on others it is "nan",
-/// and the column's blank in front of it.
-#ifdef __x86_64__
-constexpr bool kCasesAreOfThisProcessor = true;
-#else
-constexpr bool kCasesAreOfThisProcessor = false;
-#endif
-
-std::string compare(const Run& run, const Result& actual) {
-  if (kCasesAreOfThisProcessor) return compareRun(run, actual);
-  Run stated = run;
-  Result result = actual;
-  for (std::string* const text : {&stated.expected.output, &result.output}) {
-    replaceAll("-nan", " nan", text);
-  }
-  return compareRun(stated, result);
-}
-
 std::string changesBetween(const Files& before, const Files& after) {
   std::string text;
   for (const auto& [path, content] : before) {
@@ -190,7 +172,7 @@ std::string checkCase(const std::filesystem::path& program, bool update, Case* g
   for (std::size_t i = 0; i < golden->runs.size(); ++i) {
     Run& run = golden->runs[i];
     const Result actual = runner.run(run);
-    const std::string difference = compare(run, actual);
+    const std::string difference = compareRun(run, actual);
     if (!difference.empty()) {
       text +=
           "run " + std::to_string(i + 1) + " (line " + std::to_string(run.line) + ") differs\n" + difference;
