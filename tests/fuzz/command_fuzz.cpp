@@ -5,6 +5,7 @@
 #include <cmath>
 #include <cstdlib>
 #include <filesystem>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -130,7 +131,7 @@ void addGroup(const std::string& name, const sns_registry_data& items, fuzz::Hub
   }
 }
 
-fuzz::HubWorld handset(const std::string& name) {
+fuzz::HubWorld makeHandset(const std::string& name) {
   simhub::Scenario scenario;
   std::string error;
   check(simhub::loadScenario(name, {}, &scenario, &error), "the built-in handsets load");
@@ -152,6 +153,13 @@ fuzz::HubWorld handset(const std::string& name) {
   }
   for (const auto& [group, items] : scenario.registry) addGroup(group, items, &world);
   return world;
+}
+
+/// As it was made; reading a scenario takes longer than a command.
+const fuzz::HubWorld& handset(const std::string& name) {
+  static std::map<std::string, fuzz::HubWorld> known;
+  const auto found = known.find(name);
+  return found != known.end() ? found->second : known.emplace(name, makeHandset(name)).first->second;
 }
 
 int runCommand(const Call& call, bool dryRun, ssc::Connection* connection) {
