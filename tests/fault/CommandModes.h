@@ -35,6 +35,7 @@ struct CommandMode {
   Ending ending = Ending::kNoSamples;
   Notice notice = Notice::kNone;
   bool storesInRegistry = false;
+  bool dropsRecords = false;     ///< removes that file when it begins
   bool keepsRecords = false;     ///< adds to a file between its steps
   std::uint32_t ownRequest = 0;  ///< message id of a request that only this kind of sensor takes; 0: none
 
@@ -48,6 +49,10 @@ struct CommandMode {
   std::vector<Step> before;  ///< commands that have run, on a good hub, when this one starts
 
   [[nodiscard]] std::string title() const { return family + " " + name; }
+  /// What it says only when it succeeds. A request that goes well on the way has a line of its own.
+  [[nodiscard]] std::string successLine() const {
+    return closes.empty() ? "succeeded" : closes + " succeeded";
+  }
   [[nodiscard]] bool Is(std::string_view wanted) const { return title() == wanted; }
 };
 

@@ -91,13 +91,13 @@ class CrashingCommand {
   void check(const FaultedRun& run, const std::filesystem::path& root) const {
     EXPECT_FALSE(run.crashed) << "signal " << run.status << "\n" << run.output;
     if (!run.killed && run.status != 0) {
-      EXPECT_EQ(run.output.find("succeeded"), std::string::npos) << run.output;
+      EXPECT_EQ(run.output.find(mode_.successLine()), std::string::npos) << run.output;
       EXPECT_TRUE(run.output.find("ERROR: ") != std::string::npos ||
                   run.output.find("WARN: ") != std::string::npos)
           << run.output;
     }
     checkRegistry(run, root);
-    EXPECT_EQ(faultOfWorkingFiles(ready_.path(), root), "");
+    EXPECT_EQ(faultOfWorkingFiles(mode_, ready_.path(), root), "");
     checkAgain(root);
   }
 

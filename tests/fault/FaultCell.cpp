@@ -89,7 +89,7 @@ std::optional<FaultCell> ModeUnderTest::Try(const FaultRow& row) const {
   checkOutput(faulty, row.expected(mode_), &cell);
   checkTime(faulty, &cell);
   checkRegistry(before, registryFiles(root.path()), cell.result == 0 ? Stored::kPerhaps : row.stored, &cell);
-  const std::string lost = faultOfWorkingFiles(start, root.path());
+  const std::string lost = faultOfWorkingFiles(mode_, start, root.path());
   if (!lost.empty()) cell.problems.push_back(lost);
   if (cell.result != 0) checkRecovery(root.path(), &cell);
   return cell;
@@ -104,7 +104,7 @@ void ModeUnderTest::checkOutput(const WatchedRun& run, const Expected& expected,
   }
   if (!contains(printed, expected.says)) problem("does not say \"" + expected.says + "\"");
   const bool failed = captured.result != 0;
-  if (failed && contains(captured.out, "succeeded")) problem("fails, and says that it succeeded");
+  if (failed && contains(captured.out, mode_.successLine())) problem("fails, and says that it succeeded");
   if (!failed && contains(printed, "failed.")) problem("succeeds, and says that it failed");
   // A request to restart the handset says what to do about it.
   const bool said = contains(captured.err, "ERROR: ") || contains(captured.out, "WARN: ") ||

@@ -53,10 +53,14 @@ bool measuresOffsets(const CommandMode& mode) {
   return mode.family == "prox with offset" || mode.family == "prox under the display";
 }
 
+bool measuresPulses(const CommandMode& mode) {
+  return mode.Is("prox under the display pulse number") || mode.Is("prox under the display pulse current");
+}
+
 /// A collection that ends otherwise than by its time.
 Expected collectionFails(const CommandMode& mode, int result, const std::string& says) {
   // Stores 0 then, and calls that success: production lines rely on it.
-  if (mode.Is("prox under the display pulse number")) return {};
+  if (measuresPulses(mode)) return {};
   return {result, says};
 }
 
@@ -89,7 +93,8 @@ void addReadingRows(std::vector<FaultRow>* rows) {
          // Proximity's counts are whole numbers, 0 instead of none; only its offsets are not.
          if (moment == kAfter || mode.family == "prox" || mode.family == "prox with offset")
            return Expected{};
-         if (mode.Is("prox under the display pulse number") && moment == kMiddle) return Expected{};
+         if (mode.Is("als under the display sample")) return Expected{};  // it shows what it gets
+         if (measuresPulses(mode) && moment == kMiddle) return Expected{};
          // Without an infrared that is a number a reading of colors does not count.
          return mode.family == "color" ? lost(mode, moment) : Expected{ssc::kInvalid, ""};
        }},
@@ -275,6 +280,10 @@ void addAnswerRows(std::vector<FaultRow>* rows) {
        [](const CommandMode& mode) {
          return mode.family == "sar" ? Expected{ssc::kMalformed, "malformed"} : Expected{ssc::kOk, "ERROR: "};
        }});
+  rows->push_back({"Requests", "its own request is answered with nonsense", ownRequestFault("oem_malformed"),
+                   [](const CommandMode&) {
+                     return Expected{ssc::kMalformed, "malformed"};
+                   }});
   rows->push_back(
       {"Requests", "its own request is not answered", ownRequestFault("oem_silence"), [](const CommandMode&) {
          return Expected{ssc::kTimedOut, "ERROR: "};

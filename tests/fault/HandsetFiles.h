@@ -25,7 +25,7 @@ using Files = std::map<std::string, std::string>;
 
 /// What is wrong with the files between the steps of a procedure, when those of `before` must not be lost;
 /// empty: nothing.
-[[nodiscard]] std::string faultOfWorkingFiles(const std::filesystem::path& before,
+[[nodiscard]] std::string faultOfWorkingFiles(const CommandMode& mode, const std::filesystem::path& before,
                                               const std::filesystem::path& after);
 
 void copyFolder(const std::filesystem::path& from, const std::filesystem::path& to);

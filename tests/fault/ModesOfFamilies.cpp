@@ -121,6 +121,14 @@ void addUnderDisplayProximityModes(std::vector<CommandMode>* modes) {
   mode.ownRequest = 0;
   modes->push_back(mode);
 
+  CommandMode current = mode;
+  current.name = "pulse current";
+  current.device = "rufael";
+  current.words = {"-q", "prox", "pldrive", "500"};
+  current.group = "proxchipr_0_platform.prox.fac_cal";
+  current.item = "pldrive";
+  modes->push_back(current);
+
   CommandMode reset = mode;
   reset.name = "reset";
   reset.words = {"-r", "prox"};
@@ -153,10 +161,36 @@ void addUnderDisplayLightModes(std::vector<CommandMode>* modes) {
 
   mode.name = "record and solve";
   mode.words = {"-q", "als", "-w", "500", "5000"};
+  mode.dropsRecords = true;
   mode.group = "lightchip5_0_platform.als.fac_cal";
   mode.notice = Notice::kWarning;
   mode.storesInRegistry = true;
   modes->push_back(mode);
+
+  CommandMode scan = mode;
+  scan.name = "delay scan";
+  scan.words = {"-q", "als", "-s", "2", "caldelay", "1000", "11", "4", "8", "2"};
+  scan.ownRequest = 7804;
+  modes->push_back(scan);
+
+  CommandMode step = mode;
+  step.dropsRecords = false;
+  step.notice = Notice::kNone;
+  step.storesInRegistry = false;
+  step.group = "";
+  step.name = "gain step";
+  step.words = {"-q", "als", "-s", "2", "calgain", "1000", "11"};
+  step.ownRequest = 7806;
+  modes->push_back(step);
+  step.name = "pwm step";
+  step.words = {"-q", "als", "-s", "2", "pwm", "1000", "11", "40"};
+  step.ownRequest = 7808;
+  modes->push_back(step);
+  step.name = "sample";
+  step.words = {"-q", "als", "-s", "2", "sample"};
+  step.ownRequest = 0;
+  step.keepsRecords = false;
+  modes->push_back(step);
 
   CommandMode reset = mode;
   reset.name = "reset";
