@@ -94,6 +94,13 @@ std::optional<std::string> itemNames(const std::string& file) {
   return names;
 }
 
+bool holdSameState(const std::filesystem::path& one, const std::filesystem::path& other) {
+  for (const WorkingFile& file : kWorkingFiles) {
+    if (support::readFile(one / file.path) != support::readFile(other / file.path)) return false;
+  }
+  return registryFiles(one) == registryFiles(other);
+}
+
 std::string faultOfWorkingFiles(const CommandMode& mode, const std::filesystem::path& before,
                                 const std::filesystem::path& after) {
   for (const WorkingFile& file : kWorkingFiles) {

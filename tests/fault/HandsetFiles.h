@@ -20,6 +20,10 @@ using Files = std::map<std::string, std::string>;
 /// complains about is added to `complaints`.
 [[nodiscard]] Files registryFilesAfterStart(const std::filesystem::path& root, std::string* complaints);
 
+/// Whether the registry and the files between steps are, to the byte, the same: a command then finds just
+/// what it would have found.
+[[nodiscard]] bool holdSameState(const std::filesystem::path& one, const std::filesystem::path& other);
+
 /// The names of the items in a group's file, if it is one.
 [[nodiscard]] std::optional<std::string> itemNames(const std::string& file);
 
