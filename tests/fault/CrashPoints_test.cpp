@@ -104,6 +104,9 @@ class CrashingCommand {
           << run.output;
     }
     checkRegistry(run, root);
+    if (!run.killed && run.status == 0) {
+      EXPECT_TRUE(holdSameRecords(done_.path(), root)) << "it says that it kept its record\n" << run.output;
+    }
     EXPECT_EQ(faultOfWorkingFiles(mode_, ready_.path(), root), "");
     checkAgain(root);
   }

@@ -1,5 +1,7 @@
 #include "fault/HandsetFiles.h"
 
+#include <algorithm>
+#include <iterator>
 #include <system_error>
 #include <vector>
 
@@ -51,15 +53,23 @@ std::string faultOfLines(const std::filesystem::path&, const std::string& conten
 /// A file that outlives a step, below the handset's root.
 struct WorkingFile {
   const char* path;
-  bool onlyGrows;  ///< commands that start it anew are not tried here
+  enum class Kind {
+    kRecords,
+    kGrowingLog,
+    kLog
+  } kind;  ///< only records are read again; some logs start anew
   std::string (*faultOf)(const std::filesystem::path& path, const std::string& content);
 };
+using enum WorkingFile::Kind;
 constexpr WorkingFile kWorkingFiles[] = {
-    {"data/app-ephemeral/vantle_imu", true, faultOfMultipointFile},
-    {"data/app-ephemeral/vantle_color", true, faultOfColorRecords},
-    {"data/app-ephemeral/vantle_als", true, faultOfLightRecords},
-    {"mnt/vendor/persist/sensors/color.csv", true, faultOfLines},
-    {"persist/sensors/als.csv", false, faultOfLines},
+    {"data/app-ephemeral/vantle_imu", kRecords, faultOfMultipointFile},
+    {"data/app-ephemeral/vantle_color", kRecords, faultOfColorRecords},
+    {"data/app-ephemeral/vantle_als", kRecords, faultOfLightRecords},
+    {"mnt/vendor/persist/sensors/color.csv", kGrowingLog, faultOfLines},
+    {"persist/sensors/als.csv", kLog, faultOfLines},
+    {"persist/sensors/als_gain_cal.csv", kGrowingLog, faultOfLines},
+    {"persist/sensors/als_pwm_cal.csv", kGrowingLog, faultOfLines},
+    {"persist/sensors/als_delay_cal.csv", kLog, faultOfLines},
 };
 
 }  // namespace
@@ -94,6 +104,13 @@ std::optional<std::string> itemNames(const std::string& file) {
   return names;
 }
 
+bool holdSameRecords(const std::filesystem::path& one, const std::filesystem::path& other) {
+  return std::all_of(std::begin(kWorkingFiles), std::end(kWorkingFiles), [&](const WorkingFile& file) {
+    return file.kind != kRecords ||
+           support::readFile(one / file.path) == support::readFile(other / file.path);
+  });
+}
+
 bool holdSameState(const std::filesystem::path& one, const std::filesystem::path& other) {
   for (const WorkingFile& file : kWorkingFiles) {
     if (support::readFile(one / file.path) != support::readFile(other / file.path)) return false;
@@ -106,7 +123,7 @@ std::string faultOfWorkingFiles(const CommandMode& mode, const std::filesystem::
   for (const WorkingFile& file : kWorkingFiles) {
     const auto old = support::readFile(before / file.path);
     const auto now = support::readFile(after / file.path);
-    if (file.onlyGrows && !mode.dropsRecords && old && (!now || now->compare(0, old->size(), *old) != 0)) {
+    if (file.kind != kLog && !mode.dropsRecords && old && (!now || now->compare(0, old->size(), *old) != 0)) {
       return std::string(file.path) + ": records of earlier steps are gone";
     }
     if (!now || now->empty()) continue;

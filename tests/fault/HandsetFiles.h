@@ -20,6 +20,9 @@ using Files = std::map<std::string, std::string>;
 /// complains about is added to `complaints`.
 [[nodiscard]] Files registryFilesAfterStart(const std::filesystem::path& root, std::string* complaints);
 
+/// Whether the files that steps read again are the same.
+[[nodiscard]] bool holdSameRecords(const std::filesystem::path& one, const std::filesystem::path& other);
+
 /// Whether the registry and the files between steps are, to the byte, the same: a command then finds just
 /// what it would have found.
 [[nodiscard]] bool holdSameState(const std::filesystem::path& one, const std::filesystem::path& other);
