@@ -289,11 +289,13 @@ void addPerPhase(CommandMode mode, std::vector<CommandMode>* modes) {
   modes->push_back(mode);
 
   mode.name = "turn";
+  mode.streamed = "gyro";
   mode.words = {"-q", "imu-multipoint", "-p", "g+x"};
   mode.world = turning(kPoses[0], "x", 2);
   modes->push_back(mode);
 
   mode.name = "last phase";
+  mode.streamed = "accel";
   mode.words = {"-q", "imu-multipoint", "-p", "a-z"};
   for (const char* axis : {"x", "y", "z"}) {
     mode.words.push_back(std::string("--a+") + axis + "-ref" + axis);
