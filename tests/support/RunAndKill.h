@@ -9,8 +9,12 @@
 
 namespace support {
 
-/// Runs `body` in a process of its own, over and over, and kills that at some moment after its first
-/// `progress` rounds.
+/// How often a body runs at most. Few enough for what it writes to stay within a page: the kernel ends a
+/// write at the border of one when it has been killed, and no program can do anything about that.
+constexpr int kMostRounds = 16;
+
+/// Runs `body` in a process of its own, up to kMostRounds times, and kills that at some moment after its
+/// first `progress` rounds.
 template <class Body>
 void runAndKill(int progress, Body body) {
   int pipe[2];
@@ -18,10 +22,11 @@ void runAndKill(int progress, Body body) {
   const pid_t child = ::fork();
   ASSERT_GE(child, 0);
   if (child == 0) {
-    for (;;) {
+    for (int round = 0; round < kMostRounds; ++round) {
       body();
       if (::write(pipe[1], "", 1) != 1) ::_exit(1);
     }
+    for (;;) ::pause();
   }
   ::close(pipe[1]);
   char round;
