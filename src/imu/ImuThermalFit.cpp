@@ -4,6 +4,8 @@
 #include <array>
 #include <cmath>
 
+#include "framework/Statistics.h"
+
 namespace {
 
 template <std::size_t kAxes>
@@ -95,6 +97,7 @@ ThermalFit fit(const std::vector<Sample>& samples, const std::vector<float>& tem
   ThermalFit result;
   result.stdev = squareRoots(divided<kAxes>(sxx, static_cast<float>(temperatures.size() - 1)));
   result.scale = divided<kAxes>(sxt, stt);
+  for (float& element : result.scale) element = withPlainNan(element);
   for (std::size_t k = 0; k < kAxes; ++k) {
     result.bias.push_back(mean.reading[k] - result.scale[k] * mean.temperature);
   }
