@@ -77,7 +77,7 @@ void Calibrator::LogErrorEvent(const ssc::SensorUid& suid, const Event& event) c
   sns_std_error_event error;
   if (event.msg_id() != ssc::kErrorEvent || !error.ParseFromString(event.payload())) return;
   const auto info = sensorInfo.find(suid);
-  ssc::log(ssc::kLogWarn, "The hub reports error %d of %s", static_cast<int>(error.error()),
+  ssc::log(hubTroubleLevel, "The hub reports error %d of %s", static_cast<int>(error.error()),
            info == sensorInfo.end() ? "a sensor" : info->second.name.c_str());
 }
 
@@ -116,10 +116,10 @@ void Calibrator::OnReconnect() {
     }
     failed = status != ssc::kOk;
     if (failed) {
-      ssc::log(ssc::kLogWarn, "Unable to start the sensors after the hub was away. Error = %d", status);
+      ssc::log(hubTroubleLevel, "Unable to start the sensors after the hub was away. Error = %d", status);
     }
   } else {
-    ssc::log(ssc::kLogWarn, "The hub went away more than %u times", kToleratedReconnections);
+    ssc::log(hubTroubleLevel, "The hub went away more than %u times", kToleratedReconnections);
     ssc::log(ssc::kLogDebug, "Exhausted all retries");
     retryCount_ = 0;
     status = ssc::kConnectionLost;
@@ -212,7 +212,7 @@ std::vector<std::string> Calibrator::beginCollection() {
 
 void Calibrator::endCollection(int result, bool print) {
   if (!waited()) {
-    ssc::log(ssc::kLogWarn, "Unable to start the sensors. Error = %d", result);
+    ssc::log(hubTroubleLevel, "Unable to start the sensors. Error = %d", result);
     // A response that never came counts as time that has run out. The few readings that came before it, of
     // sensors not yet settled, must not be taken for the measurement.
     samples.clear();

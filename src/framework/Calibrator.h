@@ -20,6 +20,7 @@
 #include "proto/sns_registry.pb.h"
 #include "proto/sns_std.pb.h"
 #include "ssc/Client.h"
+#include "ssc/Log.h"
 #include "ssc/RegistryUtil.h"
 
 class Calibrator : public ssc::Client {
@@ -174,6 +175,9 @@ class Calibrator : public ssc::Client {
   static int Conclude(const char* what, int result);
   [[nodiscard]] static const char* Outcome(int result) { return result == ssc::kOk ? "succeeded" : "failed"; }
 
+  /// Level of what says, beside a command's own lines, why a collection failed. A command that is to say no
+  /// more than its own lines traces it.
+  int hubTroubleLevel = ssc::kLogWarn;
   bool dryRun = false;
   bool quiet = false;
   DeviceType deviceType = DeviceType::o1v1;

@@ -47,6 +47,7 @@ Expected readFails(const CommandMode&, Failure failure) {
 /// A request without a response counts as time that has run out, and then nothing was measured. A sensor that
 /// answers with an error is a silent one.
 Expected startFails(const CommandMode& mode, Failure failure) {
+  if (saysNoMore(mode) && failure != Failure::kRefused) return lost(mode, kFirst);
   if (failure == Failure::kError) return {lost(mode, kFirst).result, "The hub reports error"};
   if (failure == Failure::kRefused)
     return collectionFails(mode, ssc::kIoError, "Unable to start the sensors");
