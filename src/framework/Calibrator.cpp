@@ -12,6 +12,7 @@
 namespace {
 
 constexpr std::uint32_t kToleratedReconnections = 3;
+constexpr std::chrono::seconds kAnswerTime{3};
 
 /// Whether the sensor's stream type is `streamType` and, if so, the package that its name stands for. Results
 /// as of the library.
@@ -208,6 +209,19 @@ std::vector<std::string> Calibrator::beginCollection() {
   status = ssc::kOk;
   samples.clear();
   return GetAllConfigRequests();
+}
+
+int Calibrator::AskSensor(const sns_client_request_msg& request) {
+  {
+    const std::lock_guard<std::mutex> guard(mutex);
+    status = ssc::kOk;
+    samples.clear();
+    awaitsAnswer = true;
+  }
+  const int result = SendRequestsAndWait({request.SerializeAsString()}, kAnswerTime, nullptr);
+  const std::lock_guard<std::mutex> guard(mutex);
+  awaitsAnswer = false;
+  return result;
 }
 
 void Calibrator::endCollection(int result, bool print) {

@@ -129,6 +129,11 @@ class Calibrator : public ssc::Client {
     endCollection(result, print);
     return result;
   }
+  /// Sends one request, complete with its sensor, and waits for the event that answers it, for at most three
+  /// seconds; `awaitsAnswer` holds meanwhile. Samples of an earlier collection are dropped: they would make
+  /// the first event that a stopped stream still brings look like the last one wanted. 0 or the status that
+  /// the handler set when it ended the wait; ssc::kTimedOut; or what sending returned. Logs nothing.
+  [[nodiscard]] int AskSensor(const sns_client_request_msg& request);
   /// Whether a collection that runs for a time has come to its end.
   [[nodiscard]] static bool IsCollected(int result) { return result == ssc::kOk || result == ssc::kTimedOut; }
   /// 0 when IsCollected(result), else `result`, after a level-0 message where the collection itself logged
@@ -184,6 +189,7 @@ class Calibrator : public ssc::Client {
   std::map<ssc::SensorUid, std::vector<Sample>>
       samples;  ///< guarded by mutex: of the last collection, as they came
   std::map<ssc::SensorUid, SensorInfo> sensorInfo;  ///< what a collection streams
+  bool awaitsAnswer = false;                        ///< guarded by mutex: AskSensor is waiting
 
  private:
   std::vector<std::string> beginCollection();

@@ -91,7 +91,6 @@ constexpr const char* kScale = "scale";
 
 constexpr std::int32_t kRateHz = 5;
 constexpr std::int32_t kDefaultSamples = 10;
-constexpr std::chrono::seconds kResponseTimeout{3};
 
 bool isServed(DeviceType type) {
   return type == DeviceType::o1v1 || type == DeviceType::t5h5 || type == DeviceType::rufael ||
@@ -212,19 +211,7 @@ int UdAlsCalibrator::sendRequest(const UdAlsRequest& request) {
   sns_client_request_msg message = MakeRequest(suid);
   message.set_msg_id(request.messageId);
   message.mutable_request()->set_payload(request.payload);
-  {
-    const std::lock_guard<std::mutex> guard(mutex);
-    status = ssc::kOk;
-    // Samples that a collection left would end this wait with the first event that a stopped stream still
-    // brings.
-    samples.clear();
-    awaitsResponse_ = true;
-  }
-  const int result = SendRequestsAndWait({message.SerializeAsString()}, kResponseTimeout, nullptr);
-  {
-    const std::lock_guard<std::mutex> guard(mutex);
-    awaitsResponse_ = false;
-  }
+  const int result = AskSensor(message);
   if (result != ssc::kOk) ssc::log(ssc::kLogError, "%s", request.failure);
   return result;
 }
@@ -254,7 +241,7 @@ void UdAlsCalibrator::OnReconnect() {
     // The request is lost with the hub that had it, and no stream was running that could be started again:
     // its samples would pass for the answer.
     const std::lock_guard<std::mutex> guard(mutex);
-    if (awaitsResponse_) return;
+    if (awaitsAnswer) return;
   }
   Calibrator::OnReconnect();
 }

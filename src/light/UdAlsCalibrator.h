@@ -121,5 +121,4 @@ class UdAlsCalibrator final : public AmbientLightCommand {
 
   UdAlsArguments words_;
   float te2Delay_ = UdAlsArguments::kNotGiven;  ///< of the TE2 signal, while it is scanned
-  bool awaitsResponse_ = false;                 ///< guarded by mutex
 };

@@ -1,7 +1,5 @@
 #include "prox/ProximityOffsetCommand.h"
 
-#include <chrono>
-
 #include "proto/sns_oem_proximity.pb.h"
 #include "ssc/Log.h"
 
@@ -9,7 +7,6 @@ namespace {
 
 constexpr std::uint32_t kPoffsetRequest = 770;
 constexpr std::uint32_t kPoffsetAnswer = 771;
-constexpr std::chrono::seconds kAnswerTime{3};
 
 }  // namespace
 
@@ -26,16 +23,7 @@ int ProximityOffsetCommand::RequestSwitch(std::uint32_t messageId, const std::st
   sns_client_request_msg request = MakeRequest(suid_);
   request.set_msg_id(messageId);
   request.mutable_request()->set_payload(payload);
-  {
-    const std::lock_guard<std::mutex> guard(mutex);
-    status = ssc::kOk;
-    awaitsAnswer_ = true;
-  }
-  const int result = SendRequestsAndWait({request.SerializeAsString()}, kAnswerTime, nullptr);
-  {
-    const std::lock_guard<std::mutex> guard(mutex);
-    awaitsAnswer_ = false;
-  }
+  const int result = AskSensor(request);
   if (result != ssc::kOk) ssc::log(ssc::kLogError, "%s", failure);
   return result;
 }
@@ -63,7 +51,7 @@ bool ProximityOffsetCommand::takeEvents(const sns_client_event_msg& message) {
       if (OnAnswer(event.msg_id(), event.payload())) return true;
       continue;
     }
-    if (awaitsAnswer_) continue;
+    if (awaitsAnswer) continue;
     const sns_proximity_event* const reading = ParseReading(event.payload());
     if (reading == nullptr || OnProxEvent(*reading, event.timestamp())) return true;
   }

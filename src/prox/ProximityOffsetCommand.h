@@ -58,6 +58,4 @@ class ProximityOffsetCommand : public ProximityCommand {
   /// Whether the wait is to end.
   [[nodiscard]] bool takeEvents(const sns_client_event_msg& message);
   void reportAnswer(bool parses, bool success, bool isEnabled, const SwitchName& name);
-
-  bool awaitsAnswer_ = false;  ///< guarded by mutex
 };

@@ -34,7 +34,6 @@ constexpr std::uint32_t kCompensationResponse = 779;
 constexpr float kNoRate = -1.0F;  // the sensor runs at its own
 /// What the sensor needs to run before it can compensate.
 constexpr std::chrono::milliseconds kStartTime{50};
-constexpr std::chrono::seconds kResponseTimeout{3};
 
 }  // namespace
 
@@ -143,11 +142,7 @@ int SarCalibrator::requestCompensation() {
   sns_client_request_msg request = MakeRequest(suid_);
   request.set_msg_id(kCompensationRequest);
   request.mutable_request();
-  {
-    const std::lock_guard<std::mutex> guard(mutex);
-    status = ssc::kOk;
-  }
-  return SendRequestsAndWait({request.SerializeAsString()}, kResponseTimeout, nullptr);
+  return AskSensor(request);
 }
 
 void SarCalibrator::OnEvent(const sns_client_event_msg& message) {
