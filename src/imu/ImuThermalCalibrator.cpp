@@ -243,9 +243,11 @@ void ImuThermalCalibrator::rejectSample(const ssc::SensorUid& suid, Rejection wh
 }
 
 void ImuThermalCalibrator::updateProgress() {
-  const std::vector<Sample>& temperatures = samples[imuTemperatureSuid_];
+  // Looked for, not made: a silent thermometer is not to be among the sensors whose samples are printed.
+  const auto found = samples.find(imuTemperatureSuid_);
+  const bool isKnown = found != samples.end() && !found->second.empty();
   progress_.Update(connection->clock().now(),
-                   temperatures.empty() ? std::nullopt : std::optional(temperatures.back().values[0]));
+                   isKnown ? std::optional(found->second.back().values[0]) : std::nullopt);
 }
 
 int ImuThermalCalibrator::Calibrate() {

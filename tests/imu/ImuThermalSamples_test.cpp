@@ -49,6 +49,14 @@ TEST_F(ImuThermalTest, NoTemperatureAtAllFails) {
   }
 }
 
+TEST_F(ImuThermalTest, ASilentThermometerIsNotAmongThePrintedSensors) {
+  at(imuTemp).reading = nullptr;
+  options.quiet = false;
+  const Captured captured = run();
+  EXPECT_THAT(captured.out, HasSubstr("\nAccelerometer Samples:\n"));
+  EXPECT_THAT(captured.out, Not(HasSubstr("IMU Temperature Samples:\n")));
+}
+
 TEST_F(ImuThermalTest, OneTemperatureIsTooLittle) {
   at(imuTemp).reading = [](int index) { return index == 0 ? std::vector<float>{30} : std::vector<float>{}; };
   EXPECT_EQ(run().err, "ERROR: Temperature delta is too low (30.00-30.00 < 7.00)\n");
