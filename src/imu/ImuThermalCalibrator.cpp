@@ -281,8 +281,7 @@ int ImuThermalCalibrator::collect() {
   if (!quiet) progress_.Start(connection->clock().now(), duration);
   result = CollectSamples(duration, true);
   progress_.End();
-  result = RequireCollected(result);
-  return result == ssc::kOk ? RequireSamples(imuTemperatureSuid_) : result;
+  return RequireCollected(result);
 }
 
 /// A duration that no handset could keep the samples of is refused before it is begun, not after days.

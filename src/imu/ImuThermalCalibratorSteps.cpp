@@ -40,6 +40,8 @@ struct ImuThermalCalibrator::StoredModel {
 };
 
 int ImuThermalCalibrator::ValidateTemperatures() {
+  const int result = RequireSamples(imuTemperatureSuid_);
+  if (result != ssc::kOk) return result;
   const TemperatureSpan span = temperatureSpan(samples[imuTemperatureSuid_]);
   const auto first = static_cast<double>(span.first);
   const auto last = static_cast<double>(span.last);

@@ -41,11 +41,21 @@ TEST_F(ImuThermalTest, WithoutValidationAnyTemperatureServes) {
 
 TEST_F(ImuThermalTest, NoTemperatureAtAllFails) {
   at(imuTemp).reading = nullptr;
-  for (const char* const option : {"-i", "--"}) {
-    const Captured captured = run({"imu-thermal", option, "10"});
+  const Captured captured = run();
+  EXPECT_EQ(captured.result, kNoData);
+  EXPECT_EQ(captured.err, "ERROR: No IMU Temperature samples were received\n");
+  EXPECT_THAT(captured.out, EndsWith(std::string("Collecting samples...\n") + kFailed));
+}
+
+TEST_F(ImuThermalTest, WithoutValidationItIsTheFitThatNeedsTemperatures) {
+  at(imuTemp).reading = nullptr;
+  for (const char* const detector : {"--bump-tbrng=0.1", "--use-old-bump"}) {
+    const Captured captured = run({"imu-thermal", "-i", detector, "10"});
     EXPECT_EQ(captured.result, kNoData);
-    EXPECT_EQ(captured.err, "ERROR: No IMU Temperature samples were received\n");
-    EXPECT_THAT(captured.out, EndsWith(std::string("Collecting samples...\n") + kFailed));
+    EXPECT_EQ(captured.err, "ERROR: Insufficient data to perform linear regression\n");
+    EXPECT_THAT(captured.out, HasSubstr("Collecting samples...\nChecking for bumps...\n"));
+    EXPECT_THAT(captured.out,
+                EndsWith(std::string("Correlating Accelerometer with IMU Temperature...\n") + kFailed));
   }
 }
 
