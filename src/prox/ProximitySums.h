@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <string>
 
+#include "framework/Statistics.h"
 #include "proto/sns_proximity.pb.h"
 
 /// The sums of a collection's readings, in 32-bit float: each is added as it comes. A mean of no readings is
@@ -21,9 +22,12 @@ struct ProximitySums {
   /// A value that the event lacks counts as 0.
   void Add(const sns_proximity_event& reading);
 
-  [[nodiscard]] float MeanRaw() const { return raw / static_cast<float>(count); }
-  [[nodiscard]] float MeanPoffset() const { return poffset / static_cast<float>(count); }
-  [[nodiscard]] float MeanOre() const { return ore / static_cast<float>(count); }
+  [[nodiscard]] float MeanRaw() const { return meanOf(raw); }
+  [[nodiscard]] float MeanPoffset() const { return meanOf(poffset); }
+  [[nodiscard]] float MeanOre() const { return meanOf(ore); }
+
+ private:
+  [[nodiscard]] float meanOf(float sum) const { return withPlainNan(sum / static_cast<float>(count)); }
 };
 
 /// One line: the time in seconds, the raw value, the distance (0 for a near target, `rangeHigh` for a far

@@ -45,6 +45,15 @@ TEST(ProximitySums, AreKeptIn32BitFloat) {
 
 TEST(ProximitySums, OfNothingHaveNoMean) { EXPECT_TRUE(std::isnan(ProximitySums().MeanRaw())); }
 
+TEST(ProximitySums, MeanThatIsNoNumberHasNoSign) {
+  // Opposite infinities add up to a negative one on x86 and a positive one on the handset.
+  ProximitySums sums;
+  sums.Add(reading(100, true, {INFINITY, -std::nanf("")}));
+  sums.Add(reading(100, true, {-INFINITY, 2}));
+  EXPECT_TRUE(std::isnan(sums.MeanPoffset()) && !std::signbit(sums.MeanPoffset()));
+  EXPECT_TRUE(std::isnan(sums.MeanOre()) && !std::signbit(sums.MeanOre()));
+}
+
 TEST(ReadingLine, HasTimeCountsDistanceAndFurtherValues) {
   EXPECT_EQ(readingLine(reading(437, true, {60, 2}), 19'200'000 / 8, 5),
             "0.125000     437.000000       0.000000      60.000000       2.000000\n");
