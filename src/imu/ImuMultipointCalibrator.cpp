@@ -181,16 +181,14 @@ int ImuMultipointCalibrator::VerifyPosition() const {
   }
   if (!phase->stationary) return ssc::kOk;
   ssc::log(ssc::kLogDebug, "Validating accel data during stationary phase: %s", phase_.c_str());
-  const SampleData accelMean = GetAccelMean();
-  // A silent accelerometer is not a wrong pose.
-  if (accelMean.empty()) return notEnoughSamples(kAccelLabel);
-  if (ValidateStationaryAccel(accelMean)) return ssc::kOk;
+  if (ValidateStationaryAccel(GetAccelMean())) return ssc::kOk;
   ssc::log(ssc::kLogError, "Stationary accel data validation failed");
   return ssc::kInvalid;
 }
 
 bool ImuMultipointCalibrator::ValidateStationaryAccel(const SampleData& accelMean) const {
   const auto phase = parseImuPhase(phase_);
+  // A silent accelerometer, whose mean is empty, is in no pose either.
   if (!phase || accelMean.size() < kAxes) return false;
   const auto axis = axisOutOfPose(*phase, accelMean);
   if (!axis) return true;

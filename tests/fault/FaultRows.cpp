@@ -2,6 +2,14 @@
 #include "ssc/Results.h"
 
 namespace fault {
+namespace {
+
+/// The phase's pose is checked first, and readings that are not there are in none.
+bool checksPose(const CommandMode& mode) {
+  return mode.Is("imu-multipoint phase") || mode.Is("imu-multipoint last phase");
+}
+
+}  // namespace
 
 Overrides faultOf(const std::string& kind, const std::vector<std::string>& keys) {
   // In quotes: "nan" alone would be a number.
@@ -28,6 +36,7 @@ Expected lost(const CommandMode& mode, std::size_t moment) {
   if (moment == kAfter) return {};
   if (counts(mode)) return {ssc::kTimedOut, mode.family == "color" ? "" : "Timed out waiting for"};
   if (moment == kMiddle) return {};
+  if (checksPose(mode)) return {ssc::kInvalid, "Stationary accel data validation failed"};
   return {ssc::kNoData, ""};
 }
 

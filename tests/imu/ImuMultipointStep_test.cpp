@@ -165,6 +165,17 @@ TEST_F(ImuMultipointTest, APoseOfTwoValuesFailsWithoutNamingAnAxis) {
   EXPECT_EQ(captured.err, "ERROR: Stationary accel data validation failed\n");
 }
 
+TEST_F(ImuMultipointTest, ASilentAccelerometerIsInNoPose) {
+  perPhase();
+  silence(accel);
+  const Captured captured = run({"imu-multipoint", "-p", "a+y"});
+  EXPECT_EQ(captured.result, kInvalid);
+  EXPECT_EQ(captured.err, "ERROR: Stationary accel data validation failed\n");
+  EXPECT_THAT(captured.out, testing::EndsWith("INFO: verifying device position for phase: a+y\n"
+                                              "IMU multi-point calibration failed.\n"));
+  EXPECT_FALSE(hasFile());
+}
+
 TEST_F(ImuMultipointTest, ARotationSkipsPoseAndOutliers) {
   perPhase();
   readings(accel, [](int index) { return std::vector<float>{index % 100 == 50 ? 99.0F : 20.0F, 20, 20}; });
@@ -325,7 +336,7 @@ TEST_F(ImuMultipointTest, SilentSensorsAreNamedAndNothingIsStored) {
     for (const auto& [suid, label] : labels) {
       const auto spoken = sensor(suid).reading;
       silence(suid);
-      const Captured captured = run({"imu-multipoint", "-p", "a+z"});
+      const Captured captured = run({"imu-multipoint", "-p", "g+z"});
       EXPECT_EQ(captured.result, kNoData) << label;
       EXPECT_EQ(captured.err, "ERROR: Not enough " + label + " samples were collected\n");
       EXPECT_THAT(captured.out, testing::EndsWith("IMU multi-point calibration failed.\n"));
