@@ -31,10 +31,10 @@ enum MomentIndex : std::size_t { kFirst, kMiddle, kAfter, kMomentCount };
 
 /// What comes of readings that do not come, or do not count.
 [[nodiscard]] Expected lost(const CommandMode& mode, std::size_t moment);
-/// What comes of a collection that ends otherwise than by its time.
 /// Whether a collection that fails otherwise than by its time ends without a message: the classic ambient
 /// light.
 [[nodiscard]] bool saysNoMore(const CommandMode& mode);
+/// What comes of a collection that ends otherwise than by its time.
 [[nodiscard]] Expected collectionFails(const CommandMode& mode, int result, const std::string& says);
 /// What comes of a group that cannot be read, or written.
 [[nodiscard]] Expected groupUnreadable(const CommandMode& mode);
