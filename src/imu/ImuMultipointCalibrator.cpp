@@ -155,6 +155,8 @@ int ImuMultipointCalibrator::collectPhase() {
 int ImuMultipointCalibrator::collectPosition() {
   int result = collect();
   if (result == ssc::kOk) result = VerifyStandardDeviations();
+  // A position that nothing was measured in would be one of zeros.
+  if (result == ssc::kOk && means_.empty()) result = notEnoughSamples(kAccelLabel);
   return result == ssc::kOk ? AppendMultipointData() : result;
 }
 
@@ -234,6 +236,8 @@ int ImuMultipointCalibrator::CleanData() {
 
 int ImuMultipointCalibrator::VerifyStandardDeviations() {
   ssc::say("Verifying data...\n");
+  // Where nothing came at all there is nothing to verify: the next step says what it misses.
+  if (samples.empty()) return ssc::kOk;
   // A sensor that sent nothing is missing in `samples`, but not here.
   for (const ssc::SensorUid& suid : std::set<ssc::SensorUid>{accelSuid_, gyroSuid_, temperatureSuid_}) {
     int result = ssc::kOk;

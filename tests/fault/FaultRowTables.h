@@ -31,6 +31,8 @@ enum MomentIndex : std::size_t { kFirst, kMiddle, kAfter, kMomentCount };
 
 /// What comes of readings that do not come, or do not count.
 [[nodiscard]] Expected lost(const CommandMode& mode, std::size_t moment);
+/// Nothing came from the first moment on, and not of the measured sensor only.
+[[nodiscard]] Expected nothingCame(const CommandMode& mode);
 /// Whether a collection that fails otherwise than by its time ends without a message: the classic ambient
 /// light.
 [[nodiscard]] bool saysNoMore(const CommandMode& mode);

@@ -40,6 +40,12 @@ Expected lost(const CommandMode& mode, std::size_t moment) {
   return {ssc::kNoData, ""};
 }
 
+Expected nothingCame(const CommandMode& mode) {
+  // Verifies each sensor that came, and then misses what it was about.
+  if (mode.Is("imu-multipoint turn")) return {ssc::kInvalid, "unable to obtain rotation data"};
+  return lost(mode, kFirst);
+}
+
 bool measuresPulses(const CommandMode& mode) {
   return mode.Is("prox under the display pulse number") || mode.Is("prox under the display pulse current");
 }

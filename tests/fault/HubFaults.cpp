@@ -50,7 +50,7 @@ void addHubRows(std::vector<FaultRow>* rows) {
   addHubRow(
       "goes before the first reading, for good",
       [](const CommandMode& mode, const Traffic& good) { return awayFrom(mode, kFirst, good, {}); },
-      [](const CommandMode& mode) { return lost(mode, kFirst); }, rows);
+      nothingCame, rows);
   addHubRow(
       "goes in the middle, for good",
       [](const CommandMode& mode, const Traffic& good) { return awayFrom(mode, kMiddle, good, {}); },

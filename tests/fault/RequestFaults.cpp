@@ -51,7 +51,7 @@ Expected startFails(const CommandMode& mode, Failure failure) {
   if (failure == Failure::kError) return {lost(mode, kFirst).result, "The hub reports error"};
   if (failure == Failure::kRefused)
     return collectionFails(mode, ssc::kIoError, "Unable to start the sensors");
-  return {lost(mode, kFirst).result, "Unable to start the sensors"};
+  return {nothingCame(mode).result, "Unable to start the sensors"};
 }
 
 Expected stopFails(const CommandMode&, Failure) { return {}; }

@@ -346,6 +346,29 @@ TEST_F(ImuMultipointTest, SilentSensorsAreNamedAndNothingIsStored) {
   }
 }
 
+TEST_F(ImuMultipointTest, WhereNothingCameAtAllTheRotationIsMissed) {
+  perPhase();
+  for (const ssc::SensorUid& suid : {accel, gyro, temperature}) silence(suid);
+  const Captured captured = run({"imu-multipoint", "-p", "g+x"});
+  EXPECT_EQ(captured.result, kInvalid);
+  EXPECT_EQ(captured.err, "ERROR: unable to obtain rotation data from gyro calibration\n");
+  EXPECT_THAT(captured.out, testing::EndsWith("Verifying data...\n"
+                                              "INFO: Generating calibration info (phase: g+x)\n"
+                                              "IMU multi-point calibration failed.\n"));
+  EXPECT_EQ(run({"imu-multipoint", "-p", "g+x", "--use-gyro-rate"}).err, captured.err);
+  EXPECT_FALSE(hasFile());
+}
+
+TEST_F(ImuMultipointTest, APositionInWhichNothingCameIsNotStored) {
+  writeFile("old");
+  for (const ssc::SensorUid& suid : {accel, gyro, temperature}) silence(suid);
+  const Captured captured = run({"imu-multipoint", "first"});
+  EXPECT_EQ(captured.result, kNoData);
+  EXPECT_EQ(captured.err, "ERROR: Not enough ACCEL samples were collected\n");
+  EXPECT_THAT(captured.out, testing::EndsWith("Verifying data...\nIMU multi-point calibration failed.\n"));
+  EXPECT_EQ(file(), "old");
+}
+
 TEST_F(ImuMultipointTest, ATemperatureThatIsNotReliableInTimeIsMissing) {
   sensor(temperature).status = SNS_STD_SENSOR_SAMPLE_STATUS_UNRELIABLE;
   const Captured captured = run({"imu-multipoint", "first"});
