@@ -195,7 +195,7 @@ bool ImuMultipointCalibrator::ValidateStationaryAccel(const SampleData& accelMea
   const auto axis = axisOutOfPose(*phase, accelMean);
   if (!axis) return true;
   ssc::log(ssc::kLogError, "Accel data out of range (phase = %s, accel_mean[%c] = %f)", phase_.c_str(),
-           axisLetter(*axis), static_cast<double>(accelMean[*axis]));
+           axisLetter(*axis), static_cast<double>(withPlainNan(accelMean[*axis])));
   return false;
 }
 
