@@ -27,6 +27,47 @@ TEST_F(ImuMultipointTest, ResetStoresTheNeutralCalibrationEvenInADryRun) {
   EXPECT_EQ(notifications(), 0);
 }
 
+TEST_F(ImuMultipointTest, ResetRaisesTheVersionsOfWhatItStoresAndKeepsTheRest) {
+  options.reset = true;
+  ASSERT_EQ(run({"imu-multipoint"}).result, 0);
+  const sns_registry_data& accelData = script->registry.at(kAccelGroup);
+  EXPECT_EQ(accelData.items(0).version(), 1);  // it had none
+  EXPECT_EQ(accelData.items(0).subgrp().items(8).version(), 5);
+  EXPECT_EQ(accelData.items(1).version(), 4);
+  EXPECT_EQ(accelData.items(2).version(), 9);
+  EXPECT_EQ(accelData.items(3).version(), 1);
+  const sns_registry_data& gyroData = script->registry.at(kGyroGroup);
+  EXPECT_EQ(gyroData.items(0).subgrp().items(8).version(), 4);
+  EXPECT_EQ(gyroData.items(1).version(), 4);
+  EXPECT_EQ(gyroData.items(3).name(), "mean_temp");
+  EXPECT_EQ(gyroData.items(3).flt(), 0);
+}
+
+TEST_F(ImuMultipointTest, AResetThatCannotBeStoredPromisesNothing) {
+  options.reset = true;
+  script->registryWritesFail = true;
+  const Captured captured = run({"imu-multipoint"});
+  EXPECT_EQ(captured.result, -5);
+  EXPECT_EQ(captured.out,
+            "Searching for IMU...\nResetting IMU multi-point calibration...\n"
+            "WARN: Failed to write registry. Error = -5\n");
+  EXPECT_EQ(writes(), 1);
+}
+
+TEST_F(ImuMultipointTest, AResetWithoutItsGroupsIsTheLibrarysResult) {
+  options.reset = true;
+  const sns_registry_data accelData = script->registry.at(kAccelGroup);
+  script->registry.erase(kAccelGroup);
+  Captured captured = run({"imu-multipoint"});
+  EXPECT_EQ(captured.result, -2);
+  EXPECT_EQ(captured.out, "Searching for IMU...\n");
+  script->registry[kAccelGroup] = accelData;
+  script->registry.erase(kGyroGroup);
+  captured = run({"imu-multipoint"});
+  EXPECT_EQ(captured.result, -2);
+  EXPECT_EQ(writes(), 1);
+}
+
 TEST_F(ImuMultipointTest, ResetNeedsTheItemsItResets) {
   options.reset = true;
   const sns_registry_data whole = script->registry.at(kAccelGroup);

@@ -147,6 +147,18 @@ TEST(Outliers, SixDeviationsAreStillAccepted) {
   EXPECT_EQ(removeCounting(&samples, &reported), 1U);
 }
 
+TEST(Outliers, ExactlySixDeviationsAreStillAccepted) {
+  // Of 73 samples with a sum of squares of 72 the deviation is 1.
+  std::vector<Sample> samples(71, sampleAt(0, {0}));
+  samples.push_back(sampleAt(0, {6}));
+  samples.push_back(sampleAt(0, {-6}));
+  std::vector<float> reported;
+  EXPECT_EQ(removeCounting(&samples, &reported), 0U);
+  samples.push_back(sampleAt(0, {0}));
+  EXPECT_EQ(removeCounting(&samples, &reported), 2U);
+  EXPECT_THAT(reported, ElementsAre(6, -6));
+}
+
 TEST(Outliers, AnotherNumberOfValuesGoes) {
   auto samples = quiet(20);
   samples[3].values = {0.01F, 1.0F};

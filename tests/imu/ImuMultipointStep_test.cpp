@@ -352,6 +352,28 @@ TEST_F(ImuMultipointTest, SilentSensorsAreNamedAndNothingIsStored) {
   }
 }
 
+std::function<std::vector<float>(int)> onlyTheFirst(int count, const std::vector<float>& values) {
+  return [count, values](int index) { return index < count ? values : std::vector<float>{}; };
+}
+
+TEST_F(ImuMultipointTest, ARotationNeedsTwoReadingsOfEachInertialSensorAndOneTemperature) {
+  perPhase();
+  readings(temperature, onlyTheFirst(1, {25.5F}));
+  readings(accel, onlyTheFirst(1, {0, 0, 9.8F}));
+  Captured captured = run({"imu-multipoint", "-p", "g+x"});
+  EXPECT_EQ(captured.result, kNoData);
+  EXPECT_EQ(captured.err, "ERROR: Not enough ACCEL samples were collected\n");
+  readings(accel, onlyTheFirst(2, {0, 0, 9.8F}));
+  readings(gyro, onlyTheFirst(1, {1, 0, 0}));
+  captured = run({"imu-multipoint", "-p", "g+x"});
+  EXPECT_EQ(captured.result, kNoData);
+  EXPECT_EQ(captured.err, "ERROR: Not enough  GYRO samples were collected\n");
+  EXPECT_FALSE(hasFile());
+  readings(gyro, onlyTheFirst(2, {1, 0, 0}));
+  EXPECT_EQ(run({"imu-multipoint", "-p", "g+x"}).result, 0);
+  EXPECT_TRUE(hasFile());
+}
+
 TEST_F(ImuMultipointTest, WhereNothingCameAtAllTheRotationIsMissed) {
   perPhase();
   for (const ssc::SensorUid& suid : {accel, gyro, temperature}) silence(suid);
