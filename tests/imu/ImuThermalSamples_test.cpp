@@ -333,6 +333,29 @@ TEST_F(ImuThermalTest, SamplesOutsideTheTemperaturesAreGoneFromTheFit) {
             "ERROR: Detected bump during sample collection\n");
 }
 
+TEST_F(ImuThermalTest, TheSamplesOfASensorGetTheirTemperaturesOnce) {
+  ArgumentWords words({"imu-thermal", "10"});
+  options.command = "imu-thermal";
+  options.argc = words.argc();
+  options.argv = words.argv();
+  connection = connectTo(script);
+  ImuThermalCalibrator calibrator(connection.get());
+  ASSERT_EQ(capture([&] { return calibrator.Run(options); }).result, 0);
+
+  // Neither the same thermometer again nor what is none at all changes anything.
+  for (const ssc::SensorUid& thermometer : {imuTemp, accel}) {
+    SampleData scale;
+    SampleData bias;
+    const Captured again = capture([&] {
+      calibrator.InterpolateTemperature(accel, thermometer);
+      return calibrator.CorrelateTemperature(accel, thermometer, nullptr, &scale, &bias);
+    });
+    EXPECT_EQ(again.result, 0);
+    EXPECT_EQ(scale.toVector(), stored(kAccelScale));
+    EXPECT_EQ(bias.toVector(), stored(kAccelBias));
+  }
+}
+
 TEST_F(ImuThermalTest, AnAxisThatDoesNotCorrelateGetsNoSlope) {
   // A jitter without slope, of which rounding makes the test strike: the line leaves one bit more of it.
   at(accel).reading = [](int index) {
