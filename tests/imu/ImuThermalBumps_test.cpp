@@ -44,6 +44,8 @@ TEST(FindBumpByTemperature, ASpanOfOneRangeMakesTwoGroups) {
   const BumpSearch search = findBumpByTemperature(still(2), {30.0F, 30.1F}, kRange, kThreshold);
   EXPECT_EQ(search.outcome, Outcome::kNone);
   EXPECT_THAT(binsOf(search), ElementsAre(0U, 1U));
+  // Of numbers whose quotient is exactly one.
+  EXPECT_EQ(findBumpByTemperature(step(1, 1, 5), {30.0F, 30.5F}, 0.5F, kThreshold).outcome, Outcome::kBump);
 }
 
 TEST(FindBumpByTemperature, ASpanOfLessThanOneRangeIsTooLittle) {

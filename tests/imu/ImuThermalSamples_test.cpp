@@ -333,6 +333,22 @@ TEST_F(ImuThermalTest, SamplesOutsideTheTemperaturesAreGoneFromTheFit) {
             "ERROR: Detected bump during sample collection\n");
 }
 
+TEST_F(ImuThermalTest, TwoSamplesWithATemperatureAreEnough) {
+  const auto reading = at(accel).reading;
+  std::vector<int> sent{60, 100};
+  at(accel).reading = [&](int index) {
+    return std::count(sent.begin(), sent.end(), index) > 0 ? reading(index) : std::vector<float>{};
+  };
+  const Captured two = run();
+  EXPECT_EQ(two.result, 0) << two.err;
+  EXPECT_THAT(two.out, HasSubstr("ACCEL_SCALE:       0.001000      -0.002000       0.000000\n"));
+  sent = {60};
+  const Captured one = run();
+  EXPECT_EQ(one.result, kNoData);
+  EXPECT_THAT(one.err, StartsWith("ERROR: Insufficient data to perform linear regression\n"));
+  EXPECT_THAT(one.out, Not(HasSubstr("ACCEL_SCALE")));
+}
+
 TEST_F(ImuThermalTest, TheSamplesOfASensorGetTheirTemperaturesOnce) {
   ArgumentWords words({"imu-thermal", "10"});
   options.command = "imu-thermal";
