@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <map>
 #include <optional>
 
 namespace {
@@ -49,10 +50,15 @@ Range finiteRange(const std::vector<float>& temperatures) {
   return range;
 }
 
-void compareBins(const std::vector<Group>& bins, float threshold, BumpSearch* search) {
-  for (std::size_t index = 0; index < bins.size(); ++index) {
-    if (bins[index].count == 0) continue;
-    search->bins.push_back({index, meanOf(bins[index])});
+/// Groups by their index. Those without a sample have no entry: a narrow range makes very many of them.
+using Groups = std::map<std::uint64_t, Group>;
+
+/// The first index that a 64-bit integer cannot hold.
+constexpr float kIndexLimit = 0x1p63F;
+
+void compareGroups(const Groups& groups, float threshold, BumpSearch* search) {
+  for (const auto& [index, group] : groups) {
+    search->bins.push_back({index, meanOf(group)});
     if (search->bins.size() == 1) continue;
     const SampleData& previous = search->bins[search->bins.size() - 2].mean;
     const std::optional<float> jump = firstJump(search->bins.back().mean - previous, threshold);
@@ -74,17 +80,17 @@ BumpSearch findBumpByTemperature(const std::vector<Sample>& samples, const std::
     search.outcome = BumpSearch::Outcome::kTooFewGroups;
     return search;
   }
-  if (!(last < static_cast<float>(kMaxTemperatureBins))) {
+  if (!(last < kIndexLimit)) {
     search.outcome = BumpSearch::Outcome::kTooManyGroups;
     return search;
   }
-  std::vector<Group> bins(static_cast<std::size_t>(last) + 1);
+  Groups groups;
   const std::size_t count = std::min(samples.size(), temperatures.size());
   for (std::size_t i = 0; i < count; ++i) {
     if (!std::isfinite(temperatures[i])) continue;
-    bins[static_cast<std::size_t>((temperatures[i] - span.low) / range)].Add(samples[i]);
+    groups[static_cast<std::uint64_t>((temperatures[i] - span.low) / range)].Add(samples[i]);
   }
-  compareBins(bins, threshold, &search);
+  compareGroups(groups, threshold, &search);
   return search;
 }
 

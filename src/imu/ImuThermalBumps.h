@@ -12,7 +12,7 @@
 
 /// The samples of one temperature range.
 struct TemperatureBin {
-  std::size_t index = 0;  ///< counted from the lowest temperature
+  std::uint64_t index = 0;  ///< counted from the lowest temperature
   SampleData mean;
 };
 
@@ -21,20 +21,16 @@ struct BumpSearch {
     kNone,
     kBump,
     kTooFewGroups,   ///< nothing to compare
-    kTooManyGroups,  ///< more than kMaxTemperatureBins
+    kTooManyGroups,  ///< more than a 64-bit integer counts
   };
   Outcome outcome = Outcome::kNone;
   float jump = 0;                    ///< of a bump: the first axis that jumps, with its sign
   std::vector<TemperatureBin> bins;  ///< by temperature only: those looked at, empty ones left out
 };
 
-/// More temperature ranges than any sensible option asks for (100 °C in steps of 0.0001 °C have a quarter of
-/// them), and few enough to be kept in memory (64 MB).
-inline constexpr std::int64_t kMaxTemperatureBins = std::int64_t{1} << 22;
-
 /// Groups by temperature, `range` (°C, above 0) to a group. `temperatures[i]` belongs to `samples[i]`; what
 /// one list has more than the other is left out, as are samples without a finite temperature. Temperatures
-/// that the handset passed too quickly leave empty groups, which are skipped.
+/// that the handset passed too quickly leave empty groups, which are skipped and take no memory.
 [[nodiscard]] BumpSearch findBumpByTemperature(const std::vector<Sample>& samples,
                                                const std::vector<float>& temperatures, float range,
                                                float threshold);

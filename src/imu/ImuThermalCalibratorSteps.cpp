@@ -1,5 +1,6 @@
 // What imu-thermal does with the samples it has collected: validation, bumps, the models and their storing.
 #include <algorithm>
+#include <cinttypes>
 #include <cmath>
 
 #include <unistd.h>
@@ -68,8 +69,9 @@ int ImuThermalCalibrator::DetectBumpsByTemperature() {
   const BumpSearch search = findBumpByTemperature(samples[accelSuid_], temperatures_[accelSuid_],
                                                   bumpTemperatureRange_, bumpThreshold_);
   for (const TemperatureBin& bin : search.bins) {
-    ssc::log(ssc::kLogDebug, "bin %zu mean = %.3f, %.3f, %.3f", bin.index, static_cast<double>(bin.mean[0]),
-             static_cast<double>(bin.mean[1]), static_cast<double>(bin.mean[2]));
+    ssc::log(ssc::kLogDebug, "bin %" PRIu64 " mean = %.3f, %.3f, %.3f", bin.index,
+             static_cast<double>(bin.mean[0]), static_cast<double>(bin.mean[1]),
+             static_cast<double>(bin.mean[2]));
   }
   switch (search.outcome) {
     case BumpSearch::Outcome::kTooFewGroups:

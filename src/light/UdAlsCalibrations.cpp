@@ -64,12 +64,12 @@ int UdAlsCalibrator::loadRecords(std::size_t least, const char* what, std::vecto
   return ssc::kNoData;
 }
 
-int UdAlsCalibrator::store(const std::function<void(sns_registry_data*)>& change, const std::string& shown) {
+int UdAlsCalibrator::store(const std::function<int(sns_registry_data*)>& change, const std::string& shown) {
   ssc::say("Reading registry...\n");
   sns_registry_data data;
   int result = ssc::RegistryUtil(connection).Read(GroupName(), &data);
+  if (result == ssc::kOk) result = change(&data);
   if (result != ssc::kOk) return result;
-  change(&data);
   ssc::say("Writing registry...\n%s", shown.c_str());
   result = WriteRegistryGroups({{GroupName(), &data}});
   if (result == ssc::kOk) NotifyOrWarn({suid});
@@ -169,6 +169,7 @@ int UdAlsCalibrator::storeGainRatios(const std::vector<std::pair<const char*, Ga
             setFloatItem(gainItem(name, i).c_str(), ratios[i], data);
           }
         }
+        return ssc::kOk;
       },
       shown);
 }
@@ -187,7 +188,10 @@ int UdAlsCalibrator::calibratePwm() {
   const std::int32_t boundary = truncateToInt(brightness);
   ssc::say("PWM boundary: %d\n", boundary);
   if (SkipsWrite()) return ssc::kOk;
-  return store([boundary](sns_registry_data* data) { setIntItem(kPwmBoundary, boundary, data); });
+  return store([boundary](sns_registry_data* data) {
+    setIntItem(kPwmBoundary, boundary, data);
+    return ssc::kOk;
+  });
 }
 
 int UdAlsCalibrator::ScreenPatternCalibrate() { return Conclude(kCalibration, calibratePattern()); }
@@ -216,5 +220,6 @@ int UdAlsCalibrator::calibratePattern() {
         setFloatItem(patternItem(kColors[i], j).c_str(), lines[i][j], data);
       }
     }
+    return ssc::kOk;
   });
 }

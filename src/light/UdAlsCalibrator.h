@@ -107,9 +107,10 @@ class UdAlsCalibrator final : public AmbientLightCommand {
   /// Loads at least `least` records. ssc::kNoData after a level-0 message that there is too little for
   /// `what`.
   [[nodiscard]] int loadRecords(std::size_t least, const char* what, std::vector<SampleData>* records);
-  /// Reads the group, lets `change` put the results into it, writes it and tells the sensor. `shown` is said
-  /// between the announcement of the write and the write.
-  [[nodiscard]] int store(const std::function<void(sns_registry_data*)>& change,
+  /// Reads the group, lets `change` put the results into it (0, or a result that ends it with nothing
+  /// written), writes it and tells the sensor. `shown` is said between the announcement of the write and the
+  /// write.
+  [[nodiscard]] int store(const std::function<int(sns_registry_data*)>& change,
                           const std::string& shown = std::string());
   [[nodiscard]] int storeGainRatios(const std::vector<std::pair<const char*, GainRatios>>& channels);
 

@@ -117,13 +117,14 @@ int UdAlsCalibrator::calibrateDelay() {
   ssc::say("Delay of minimum clear value: %14.6f\n", static_cast<double>(best));
   result = RequireFinite("The delay of the minimum clear value", {best});
   if (result != ssc::kOk || SkipsWrite()) return result;
-  if (!isTe2 && words_.mode != UdAlsMode::kDelayCalibration) {
-    ssc::log(ssc::kLogError, "Invalid mode");
-    return ssc::kInvalid;
-  }
-  return store([best, isTe2](sns_registry_data* data) {
+  return store([this, best, isTe2](sns_registry_data* data) {
+    if (!isTe2 && words_.mode != UdAlsMode::kDelayCalibration) {
+      ssc::log(ssc::kLogError, "Invalid mode");
+      return ssc::kInvalid;
+    }
     setFloatItem(isTe2 ? kTe2Delay : kDelay, best, data);
     if (isTe2) programTe2(best);
+    return ssc::kOk;
   });
 }
 

@@ -20,9 +20,10 @@ inline constexpr std::uint32_t kUdAlsSetGainItimeRequest = 7814;
 struct UdAlsRequest {
   std::uint32_t messageId = 0;
   std::string payload;  ///< an encoded sns_oem_* message
-  const char* announcement =
-      "";                    ///< said before it is sent; empty: nothing, the command says more of its own
-  const char* failure = "";  ///< level-0 message when it cannot be sent or is not answered
+  /// Said before it is sent; empty: nothing, the command says more of its own.
+  const char* announcement = "";
+  /// Level-0 message when it cannot be sent or is not answered.
+  const char* failure = "";
 };
 
 /// The request of the arguments' mode; none for modes that only read the stream.
@@ -31,8 +32,8 @@ struct UdAlsRequest {
 struct UdAlsResponse {
   enum class Kind { kSucceeded, kFailed, kMalformed };
   Kind kind = Kind::kSucceeded;
-  std::string
-      text;  ///< a line for the user, newline included, of a success; else the level-0 message. May be empty
+  /// Of a success a line for the user, newline included, or nothing; else the level-0 message.
+  std::string text;
 };
 
 /// What an event says as the answer to a request; nothing when it is none.

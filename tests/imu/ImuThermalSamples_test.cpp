@@ -333,6 +333,45 @@ TEST_F(ImuThermalTest, SamplesOutsideTheTemperaturesAreGoneFromTheFit) {
             "ERROR: Detected bump during sample collection\n");
 }
 
+TEST_F(ImuThermalTest, TwoSamplesWithATemperatureAreEnough) {
+  const auto reading = at(accel).reading;
+  std::vector<int> sent{60, 100};
+  at(accel).reading = [&](int index) {
+    return std::count(sent.begin(), sent.end(), index) > 0 ? reading(index) : std::vector<float>{};
+  };
+  const Captured two = run();
+  EXPECT_EQ(two.result, 0) << two.err;
+  EXPECT_THAT(two.out, HasSubstr("ACCEL_SCALE:       0.001000      -0.002000       0.000000\n"));
+  sent = {60};
+  const Captured one = run();
+  EXPECT_EQ(one.result, kNoData);
+  EXPECT_THAT(one.err, StartsWith("ERROR: Insufficient data to perform linear regression\n"));
+  EXPECT_THAT(one.out, Not(HasSubstr("ACCEL_SCALE")));
+}
+
+TEST_F(ImuThermalTest, TheSamplesOfASensorGetTheirTemperaturesOnce) {
+  ArgumentWords words({"imu-thermal", "10"});
+  options.command = "imu-thermal";
+  options.argc = words.argc();
+  options.argv = words.argv();
+  connection = connectTo(script);
+  ImuThermalCalibrator calibrator(connection.get());
+  ASSERT_EQ(capture([&] { return calibrator.Run(options); }).result, 0);
+
+  // Neither the same thermometer again nor what is none at all changes anything.
+  for (const ssc::SensorUid& thermometer : {imuTemp, accel}) {
+    SampleData scale;
+    SampleData bias;
+    const Captured again = capture([&] {
+      calibrator.InterpolateTemperature(accel, thermometer);
+      return calibrator.CorrelateTemperature(accel, thermometer, nullptr, &scale, &bias);
+    });
+    EXPECT_EQ(again.result, 0);
+    EXPECT_EQ(scale.toVector(), stored(kAccelScale));
+    EXPECT_EQ(bias.toVector(), stored(kAccelBias));
+  }
+}
+
 TEST_F(ImuThermalTest, AnAxisThatDoesNotCorrelateGetsNoSlope) {
   // A jitter without slope, of which rounding makes the test strike: the line leaves one bit more of it.
   at(accel).reading = [](int index) {

@@ -14,7 +14,15 @@ using testing::StartsWith;
 
 constexpr float kNan = std::numeric_limits<float>::quiet_NaN();
 
-class UdAlsCalibrations : public UdAlsSteps {};
+class UdAlsCalibrations : public UdAlsSteps {
+ protected:
+  /// Three steps of a scan whose clear level is least at `delay`.
+  static std::vector<SampleData> parabolaAround(float delay, float step) {
+    return {makeUdAlsRecord({{kUdAlsDelay, delay - step}, {kUdAlsMeanClear, 5}}),
+            makeUdAlsRecord({{kUdAlsDelay, delay}, {kUdAlsMeanClear, 3}}),
+            makeUdAlsRecord({{kUdAlsDelay, delay + step}, {kUdAlsMeanClear, 5}})};
+  }
+};
 
 // Delay scans.
 
@@ -102,7 +110,71 @@ TEST_F(UdAlsCalibrations, AFlatScanHasNoBestDelay) {
   EXPECT_EQ(writes(), 0);
 }
 
+TEST_F(UdAlsCalibrations, AParabolaThatOpensDownwardsGivesTheDelayOfTheMostLight) {
+  readClearOfEachStep({3, 5, 3});
+  const Captured captured = run({"-s", "1", "caldelay", "100", "3", "1", "3", "1"});
+  EXPECT_EQ(captured.result, 0) << captured.err;
+  EXPECT_EQ(captured.err, "");
+  EXPECT_EQ(stored("delay")->flt(), 2.0F);
+}
+
+TEST_F(UdAlsCalibrations, ADelayIsStoredInModesThatScannedOneOnly) {
+  EXPECT_EQ(run({"-s", "1", "sample"}).result, 0);
+  giveRecords(parabolaAround(2, 1));
+  const Captured captured = capture([&] { return calibrator->DelayCalibrate(); });
+  EXPECT_EQ(captured.result, -22);
+  EXPECT_EQ(captured.err, "ERROR: Invalid mode\n");
+  EXPECT_THAT(captured.out, EndsWith("Delay of minimum clear value:       2.000000\nReading registry...\n"
+                                     "Calibration failed.\n"));
+  EXPECT_EQ(writes(), 0);
+}
+
 // The display's TE2 table.
+
+class UdAlsTe2Calibration : public UdAlsCalibrations {
+ protected:
+  /// A scan with a node that takes its table; what it found is then replaced by these records.
+  void scanAndGive(const std::vector<SampleData>& records) {
+    give(kTe2Node, std::string(39, 'x'));
+    readClearOfEachStep({5, 3, 5});
+    ASSERT_EQ(run({"-s", "1", "caldelay_te2", "100", "3", "1.5", "20", "40", "10"}).result, 0);
+    giveRecords(records);
+  }
+  [[nodiscard]] Captured calibrate() {
+    return capture([this] { return calibrator->DelayCalibrate(); });
+  }
+};
+
+TEST_F(UdAlsTe2Calibration, RoundsTheBestEdgeToAWholeLine) {
+  scanAndGive(parabolaAround(1500.4F, 100));
+  const Captured captured = calibrate();
+  EXPECT_EQ(captured.result, 0) << captured.err;
+  EXPECT_THAT(captured.out, HasSubstr("Delay of minimum clear value:    1500.000000\n"));
+  EXPECT_EQ(stored("delay_te2")->flt(), 1500.0F);
+  EXPECT_THAT(content(kTe2Node), StartsWith("2055 317 3240 1500 2354 13 2354 13"));
+}
+
+TEST_F(UdAlsTe2Calibration, IsStoredThoughTheNodeCannotBeOpened) {
+  scanAndGive(parabolaAround(1500, 100));
+  std::filesystem::remove(folder.path() / kTe2Node);
+  const Captured captured = calibrate();
+  EXPECT_EQ(captured.result, 0);
+  EXPECT_EQ(captured.err, "ERROR: Failed to open TE2 table node.\n");
+  EXPECT_THAT(captured.out, EndsWith("Reading registry...\nWriting registry...\nCalibration succeeded.\n"));
+  EXPECT_EQ(stored("delay_te2")->flt(), 1500.0F);
+}
+
+TEST_F(UdAlsTe2Calibration, IsStoredThoughTheNodeRefusesTheTable) {
+  scanAndGive(parabolaAround(1500, 100));
+  std::filesystem::remove(folder.path() / kTe2Node);
+  std::filesystem::create_symlink("/dev/full", folder.path() / kTe2Node);
+  const Captured captured = calibrate();
+  EXPECT_EQ(captured.result, 0);
+  EXPECT_EQ(captured.err, "ERROR: Failed to close TE2 table node.\n");
+  EXPECT_THAT(captured.out, EndsWith("Reading registry...\nStart setting TE2 table...\nWriting registry...\n"
+                                     "Calibration succeeded.\n"));
+  EXPECT_EQ(stored("delay_te2")->flt(), 1500.0F);
+}
 
 TEST_F(UdAlsCalibrations, SettingTheTe2TableWaitsHalfASecond) {
   give(kTe2Node, std::string(39, 'x'));
@@ -146,6 +218,41 @@ TEST_F(UdAlsCalibrations, AComputationThatNeedsMoreRecordsSaysWhat) {
     EXPECT_EQ(captured.err, std::string("ERROR: ") + message + '\n');
     EXPECT_THAT(captured.out, EndsWith("INFO: Got 1 records\nCalibration failed.\n"));
   }
+}
+
+TEST_F(UdAlsCalibrations, TheLuxScaleNeedsARecordOfAnyKind) {
+  EXPECT_EQ(run({"-s", "1", "sample"}).result, 0);
+  giveRecords({});
+  const Captured none = capture([&] { return calibrator->CalibrateLux(); });
+  EXPECT_EQ(none.result, -61);
+  EXPECT_EQ(none.err, "ERROR: Insufficient data to compute lux coefficients\n");
+  EXPECT_THAT(none.out, EndsWith("INFO: Got 0 records\nCalibration failed.\n"));
+
+  giveRecords({makeUdAlsRecord({{kUdAlsReferenceLux, 100}, {kUdAlsMeanLux, 50}}),
+               makeUdAlsRecord({{kUdAlsReferenceLux, 200}, {kUdAlsMeanLux, 0}})});
+  const Captured dark = capture([&] { return calibrator->CalibrateLux(); });
+  EXPECT_EQ(dark.result, 0);
+  EXPECT_THAT(dark.out, HasSubstr("INFO: Got 2 records\nLUX_SCALE:       1.000000\nWriting registry...\n"));
+  EXPECT_EQ(stored("scale")->version(), 4);
+}
+
+TEST_F(UdAlsCalibrations, ATornWorkingFileIsComputedFromByNobody) {
+  const std::vector<SampleData> steps = parabolaAround(2, 1);
+  std::string bytes;
+  for (const SampleData& record : steps) appendFloats(record, &bytes);
+  give(kDataFile, bytes + "torn");
+  EXPECT_EQ(run({"-s", "1", "sample"}).result, 0);
+  int (UdAlsCalibrator::*const computations[])() = {
+      &UdAlsCalibrator::CalibrateLux,    &UdAlsCalibrator::GainCalibrate,
+      &UdAlsCalibrator::IRGainCalibrate, &UdAlsCalibrator::PwmCalibrate,
+      &UdAlsCalibrator::DelayCalibrate,  &UdAlsCalibrator::ScreenPatternCalibrate};
+  for (const auto computation : computations) {
+    const Captured captured = capture([&] { return (calibrator.get()->*computation)(); });
+    EXPECT_EQ(captured.result, -61);
+    EXPECT_EQ(captured.err, "ERROR: Data file is incomplete\n");
+    EXPECT_EQ(captured.out, "Reading data file...\nCalibration failed.\n");
+  }
+  EXPECT_EQ(writes(), 0);
 }
 
 TEST_F(UdAlsCalibrations, AComputationWithoutAGroupFails) {

@@ -171,9 +171,11 @@ TEST_F(UdAlsConversation, EventsOfAnotherSensorDoNotCount) {
     for (int i = 1; i <= 20; ++i) hub.SendReading(Milliseconds(i), {9, 9}, reading(7));
     for (int i = 1; i <= 10; ++i) hub.SendReading(Milliseconds(100 + i), light, reading(50));
   };
+  globals.quiet = false;
   const Captured captured = run({"sample"});
   EXPECT_EQ(captured.result, 0) << captured.err;
   EXPECT_THAT(captured.out, HasSubstr("LUX_MEAN:       50.000000\n"));
+  EXPECT_THAT(captured.out, Not(HasSubstr("7.000000")));  // nor are they printed
   EXPECT_EQ(elapsed(), Milliseconds(110));
 }
 
