@@ -1,4 +1,5 @@
 #include "main/Driver.h"
+#include "main/StandardStreams.h"
 
 #ifdef VANTLE_SIMULATOR
 #include <cstdio>
@@ -8,6 +9,7 @@
 #endif
 
 int main(int argc, char** argv) {
+  openMissingStandardStreams();
 #ifdef VANTLE_SIMULATOR
   if (!prepareSimulatedHandset(stderr)) return ssc::kInvalid;
   return runVantle(argc, argv, makeEmbeddedHub);
