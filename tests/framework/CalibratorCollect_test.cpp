@@ -297,6 +297,17 @@ TEST_F(CalibratorReconnectTooOften, AHubThatRefusesToStreamAgainEndsIt) {
             "DEBUG: Retry failed\n");
 }
 
+TEST_F(CalibratorReconnectTooOften, AReconnectionIsTracedAtTheHighestLevel) {
+  loseHub(1);
+  script->sensors[0].reading = nullptr;
+  ssc::setLogLevel(ssc::kLogVerbose);
+  EXPECT_EQ(collect(seconds(1)).out,
+            "Collecting samples...\n"
+            "VERBOSE: virtual void Calibrator::OnReconnect() -->\n"
+            "DEBUG: Retry 1\n"
+            "VERBOSE: virtual void Calibrator::OnReconnect() <--\n");
+}
+
 TEST_F(CalibratorReconnectTooOften, AHubThatStaysAwayIsATimeOut) {
   script->onRequest = [](ScriptedHub& hub, const sns_client_request_msg& request) {
     if (request.msg_id() == 513) hub.GoAwayAndReturn(milliseconds(150), std::chrono::hours(1));
@@ -331,6 +342,15 @@ TEST_F(CalibratorPrint, EachSensorsSamplesAndRateInKeyOrder) {
             "(count 3 @ ~4.000 Hz)\n\n"
             "Temperature Samples:\n"
             "2.000000      25.500000\n");
+}
+
+TEST_F(CalibratorPrint, SamplesOfOneMomentHaveAnInfiniteRate) {
+  calibrator->SetSensorInfo(a, "Barometer", 10);
+  store(a, 1, {1});
+  store(a, 1, {2});
+  EXPECT_EQ(
+      printed(),
+      "\nBarometer Samples:\n1.000000       1.000000\n1.000000       2.000000\n(count 2 @ ~inf Hz)\n\n");
 }
 
 TEST_F(CalibratorPrint, NothingAtAllWhenQuiet) {

@@ -108,6 +108,14 @@ TEST_F(CalibratorLookup, AFirstSensorOfAnotherStreamTypeIsTakenButDecidesNoPacka
   EXPECT_EQ(package, "");
 }
 
+TEST_F(CalibratorLookup, OfADataTypeThatIsAskedForTwiceTheFirstFindIsKept) {
+  script->sensors = {{p1, "pressure", "chipa", kOnChange}, {p2, "pressure", "chipb"}};
+  EXPECT_EQ(lookup({"pressure", "sensor_temperature"}).result, kNotFound);
+  script->sensors.push_back({t1, "sensor_temperature", "chipb"});
+  EXPECT_EQ(lookup({"pressure", "sensor_temperature", "pressure"}).result, 0);
+  EXPECT_EQ(suids, (Suids{{"pressure", p1}, {"sensor_temperature", t1}}));
+}
+
 TEST_F(CalibratorLookup, WantsNoTargets) {
   script->sensors = {{p1, "pressure", "chipa"}};
   connection = connectTo(script);

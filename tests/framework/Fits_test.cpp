@@ -1,5 +1,6 @@
 #include "framework/Fits.h"
 
+#include <cmath>
 #include <random>
 
 #include <gtest/gtest.h>
@@ -37,6 +38,20 @@ TEST(LinearFit, OfNoPointsWritesNothing) {
 TEST(LinearFit, WithoutATargetSaysWhetherThereIsALine) {
   EXPECT_TRUE(linearFit({{0, 1}, {1, 3}}, nullptr));
   EXPECT_FALSE(linearFit({{1, 1}, {1, 2}}, nullptr));
+}
+
+TEST(LinearFit, OfWhatIsNoNumberIsALineThatIsNone) {
+  SampleData line;
+  EXPECT_TRUE(linearFit({{0, 1}, {std::nanf(""), 2}}, &line));
+  ASSERT_EQ(line.size(), 2U);
+  EXPECT_TRUE(std::isnan(line[0]));
+  EXPECT_TRUE(std::isnan(line[1]));
+}
+
+TEST(LinearFit, OfXTooCloseForAFloatIsNone) {
+  SampleData line{7};
+  EXPECT_FALSE(linearFit({{0, 1}, {1e-30F, 2}}, &line));  // Σ(x − x̄)² underflows to 0
+  EXPECT_EQ(line, SampleData({7}));
 }
 
 TEST(LinearFit, IsTheLeastSquaresLineOfNoisyPoints) {
@@ -106,6 +121,11 @@ TEST(QuadraticFit, OfEqualXGivesZerosAndSuccessAndSaysSo) {
 TEST(QuadraticFit, WithoutATargetStillSaysThatThereWereEnoughPoints) {
   EXPECT_TRUE(quadraticFit({{0, 0}, {1, 1}, {2, 4}}, nullptr));
   EXPECT_FALSE(quadraticFit({{0, 0}}, nullptr));
+}
+
+TEST(QuadraticFit, WithoutATargetStillSaysThatTheMatrixIsSingular) {
+  const Captured captured = capture([] { EXPECT_TRUE(quadraticFit({{2, 1}, {2, 2}, {2, 3}}, nullptr)); });
+  EXPECT_EQ(captured.out, "Matrix does not have a Inverse");
 }
 
 TEST(QuadraticFit, SumsInDouble) {

@@ -1,6 +1,7 @@
 #include "framework/Matrix3by3.h"
 
 #include <cmath>
+#include <limits>
 #include <random>
 
 #include <gtest/gtest.h>
@@ -40,6 +41,14 @@ TYPED_TEST(Matrix3by3Of, ASingularMatrixGivesZerosAndSaysSo) {
   });
   EXPECT_EQ(inverse, Matrix3by3<TypeParam>());
   EXPECT_EQ(captured.out, "Matrix does not have a Inverse");
+}
+
+TYPED_TEST(Matrix3by3Of, ADeterminantThatIsNoNumberIsNotZero) {
+  Matrix3by3<TypeParam> matrix = identity<TypeParam>();
+  matrix(0, 0) = std::numeric_limits<TypeParam>::quiet_NaN();
+  Matrix3by3<TypeParam> inverse;
+  EXPECT_EQ(capture([&] { inverse = matrix.Inverse(); }).out, "");
+  EXPECT_TRUE(std::isnan(inverse(0, 0)));
 }
 
 TYPED_TEST(Matrix3by3Of, InverseTimesMatrixIsTheIdentity) {

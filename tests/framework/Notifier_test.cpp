@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "ssc/Log.h"
+#include "support/Capture.h"
 #include "support/ScriptedHub.h"
 
 namespace {
@@ -83,6 +85,23 @@ TEST_F(NotifierTest, AConfirmationBehindAnUnrelatedEventOfTheSameMessageCounts) 
   };
   EXPECT_EQ(notify({a}), 0);
   EXPECT_EQ(elapsed(), milliseconds(20));
+}
+
+TEST_F(NotifierTest, ItsHandlerIsTracedAtTheHighestLevel) {
+  ssc::setLogLevel(ssc::kLogVerbose);
+  const Captured captured = capture([&] { return notify({a}); });
+  ssc::setLogLevel(ssc::kLogInfo);
+  EXPECT_EQ(captured.result, 0);
+  EXPECT_EQ(captured.out,
+            "VERBOSE: virtual void Notifier::OnEvent(const sns_client_event_msg &) -->\n"
+            "VERBOSE: virtual void Notifier::OnEvent(const sns_client_event_msg &) <--\n");
+}
+
+TEST_F(NotifierTest, AFailureIsLeftToTheCallerToReport) {
+  script->sensors[0].confirms = false;
+  const Captured captured = capture([&] { return notify({a}); });
+  EXPECT_EQ(captured.result, -110);
+  EXPECT_EQ(captured.out + captured.err, "");
 }
 
 TEST_F(NotifierTest, ALateConfirmationIsATimeOut) {

@@ -67,6 +67,15 @@ TEST(SampleStdev, OfVectorsIsElementWise) {
   EXPECT_EQ(sampleStdev(samples, SampleData({2, 20})), SampleData({std::sqrt(2.0F), std::sqrt(200.0F)}));
 }
 
+TEST(SampleStdev, OfVectorsTakesValuesBeyondTheMeanAsTheyAre) {
+  const auto samples = samplesOf({{1, 3}, {3, 4}, {2}});
+  EXPECT_EQ(sampleStdev(samples, SampleData({2})), SampleData({1, std::sqrt(25.0F / 2)}));
+}
+
+TEST(SampleStdev, OfVectorsTheFirstSampleFixesTheDimension) {
+  EXPECT_EQ(sampleStdev(samplesOf({{1}, {3, 9}}), SampleData({2, 5})), SampleData({std::sqrt(2.0F)}));
+}
+
 TEST(SampleStdev, SumsSquaresIn32BitFloatInTheSamplesOrder) {
   EXPECT_EQ(sampleStdev(samplesOf({{4096}, {1}, {1}}), 0.0F), std::sqrt(16777216.0F / 2.0F));
   EXPECT_EQ(sampleStdev(samplesOf({{1}, {1}, {4096}}), 0.0F), std::sqrt(16777218.0F / 2.0F));
