@@ -136,6 +136,15 @@ TEST_F(DriverTest, AnUnknownDeviceEndsItWithoutUsage) {
   EXPECT_EQ(connections, 0);
 }
 
+TEST_F(DriverTest, OfSeveralDevicesTheLastOneCounts) {
+  const std::string thresholds = run({"vantle", "prox", "-h"}).out;
+  const std::string underDisplay = run({"vantle", "-d", "rufael", "prox", "-h"}).out;
+  EXPECT_NE(thresholds, underDisplay);
+  EXPECT_EQ(run({"vantle", "-d", "rufael", "-d", "OSTREL", "prox", "-h"}).out, thresholds);
+  EXPECT_EQ(run({"vantle", "-d", "OSTREL", "-d", "rufael", "prox", "-h"}).out, underDisplay);
+  EXPECT_EQ(run({"vantle", "-d", "none", "-d", "OSTREL", "prox", "-h"}).result, kInvalid);
+}
+
 TEST_F(DriverTest, AVerbosityOutOfRangeIsAWarning) {
   for (const char* level : {"0", "5", "9", "-1"}) {
     const Captured captured = run({"vantle", "-v", level, "-q", "baro", "1000"});
@@ -165,6 +174,11 @@ TEST_F(DriverTest, ALaterNumberMakesGoodAnEarlierVerbosity) {
   EXPECT_EQ(run({"vantle", "-v", "x", "-v", "3", "-q", "baro", "1000"}).result, 0);
   EXPECT_EQ(run({"vantle", "-v", "x", "-v", "9", "-q", "baro", "1000"}).result, 0);
   EXPECT_EQ(run({"vantle", "-v", "3", "-v", "x", "-q", "baro", "1000"}).result, -2147483647);
+}
+
+TEST_F(DriverTest, AVerbosityOutOfRangeLeavesAnEarlierOneAsItIs) {
+  run({"vantle", "-v", "3", "-v", "9", "baro", "-h"});
+  EXPECT_EQ(ssc::logLevel(), 3);
 }
 
 TEST_F(DriverTest, AVerbosityMayBeHexadecimalOrOctal) {
