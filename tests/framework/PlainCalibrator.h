@@ -26,6 +26,8 @@ class PlainCalibrator : public Calibrator {
   std::function<bool(std::size_t count)> endsAfter;
   std::function<bool(std::uint32_t messageId)> onOtherEvent;
 
+  using Calibrator::AskSensor;
+  using Calibrator::awaitsAnswer;
   using Calibrator::CollectSamples;
   using Calibrator::Conclude;
   using Calibrator::CopyGlobalOptions;
