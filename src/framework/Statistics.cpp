@@ -31,7 +31,8 @@ float sampleFloatMean(const std::vector<Sample>& samples) {
 SampleData sampleDataMean(const std::vector<Sample>& samples) {
   SampleData mean;
   for (const Sample& sample : samples) mean += sample.values;
-  mean /= static_cast<float>(samples.size());
+  const auto count = static_cast<float>(samples.size());
+  for (float& value : mean) value = withPlainNan(value / count);
   return mean;
 }
 

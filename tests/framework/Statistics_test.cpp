@@ -53,6 +53,9 @@ TEST(SampleStdev, OfOneSampleIsNotANumber) {
 
 TEST(SampleStatistics, PrintNoSignOfWhatIsNotANumber) {
   EXPECT_FALSE(std::signbit(sampleFloatMean({})));
+  const auto opposite = samplesOf({{INFINITY}, {-INFINITY}});
+  EXPECT_TRUE(std::isnan(sampleDataMean(opposite)[0]));
+  EXPECT_FALSE(std::signbit(sampleDataMean(opposite)[0]));
   EXPECT_FALSE(std::signbit(sampleStdev(samplesOf({{5}}), 5.0F)));
   EXPECT_FALSE(std::signbit(sampleStdev(samplesOf({{5}}), SampleData({5}))[0]));
 }
