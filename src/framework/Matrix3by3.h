@@ -1,9 +1,11 @@
 #pragma once
 
 #include <array>
+#include <cmath>
 #include <concepts>
 #include <cstddef>
 #include <cstdio>
+#include <limits>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -32,10 +34,14 @@ class Matrix3by3 {
 
   /// Three lines "<prefix>[ a, b, c ]", one a row, with six significant digits.
   [[nodiscard]] std::string ToString(const std::string& prefix) const {
+    // What is not a number has no sign: which one it got depends on the processor.
+    const auto plain = [](T value) {
+      return std::isnan(value) ? std::numeric_limits<T>::quiet_NaN() : value;
+    };
     std::ostringstream text;
     for (std::size_t row = 0; row < 3; ++row) {
-      text << prefix << "[ " << (*this)(row, 0) << ", " << (*this)(row, 1) << ", " << (*this)(row, 2)
-           << " ]\n";
+      text << prefix << "[ " << plain((*this)(row, 0)) << ", " << plain((*this)(row, 1)) << ", "
+           << plain((*this)(row, 2)) << " ]\n";
     }
     return text.str();
   }

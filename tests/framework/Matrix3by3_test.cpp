@@ -84,6 +84,13 @@ TYPED_TEST(Matrix3by3Of, PrintsSixSignificantDigits) {
   EXPECT_EQ(matrix.ToString(""), "[ 0.333333, 1.23457e+06, 1e-07 ]\n[ 0, -2.5, 0 ]\n[ 0, 0, 100000 ]\n");
 }
 
+TYPED_TEST(Matrix3by3Of, PrintsNoSignOfWhatIsNotANumber) {
+  const TypeParam none = std::numeric_limits<TypeParam>::quiet_NaN();
+  const TypeParam infinity = std::numeric_limits<TypeParam>::infinity();
+  EXPECT_EQ(Matrix3by3<TypeParam>({-none, none, -infinity, 0, 0, 0, 0, 0, 0}).ToString(""),
+            "[ nan, nan, -inf ]\n[ 0, 0, 0 ]\n[ 0, 0, 0 ]\n");
+}
+
 TEST(Matrix3by3Product, IsMatrixTimesColumn) {
   const Matrix3by3<float> matrix({1, 2, 3, 4, 5, 6, 7, 8, 9});
   EXPECT_EQ(matrix * std::vector<float>({1, 10, 100}), std::vector<float>({321, 654, 987}));
