@@ -24,6 +24,15 @@ constexpr std::array<const char*, 5> kLevelWords{"ERROR", "WARN", "INFO", "DEBUG
 constexpr const char* kSayWord = "SAY";
 constexpr const char* kEraseLine = "\r\x1b[K";  // to the line's start, and clear to its end
 
+/// Whether the last line has no end, as when the disk was full.
+bool endsWithinLine(const std::string& path) {
+  const Descriptor file = openWorkingFile(path, WorkingFileUse::kRead);
+  if (!file.valid()) return false;
+  const off_t size = ::lseek(file.get(), 0, SEEK_END);
+  char last = '\n';
+  return size > 0 && ::pread(file.get(), &last, 1, size - 1) == 1 && last != '\n';
+}
+
 /// The log file. Lines come in pieces; each whole line gets its time stamp when its newline arrives, or when
 /// text of another level word cuts it short.
 class LogFile {
@@ -36,6 +45,7 @@ class LogFile {
     if (file_ == nullptr) return -errno;
     (void)file.release();
     std::setvbuf(file_, nullptr, _IOLBF, BUFSIZ);
+    if (endsWithinLine(path)) addRaw("\n");
     return 0;
   }
 

@@ -6,6 +6,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <iterator>
 #include <string>
 #include <thread>
 #include <vector>
@@ -239,6 +240,20 @@ TEST_F(LogTest, FileIsAppendedTo) {
   std::string error;
   shown(&out, &error);
   EXPECT_EQ(loggedLines().size(), 2U);
+}
+
+TEST_F(LogTest, FileThatEndsWithinALineIsGoneOnWithOnANewOne) {
+  const auto content = [&] {
+    std::ifstream file(path());
+    return std::string{std::istreambuf_iterator<char>(file), {}};
+  };
+  std::ofstream(path()) << "cut sho";
+  for (int run = 0; run < 2; ++run) {
+    ASSERT_EQ(ssc::openLogFile(path()), 0);
+    ssc::fsay("$ vantle \n");
+    ssc::closeLogFile();
+  }
+  EXPECT_EQ(content(), "cut sho\n$ vantle \n$ vantle \n");
 }
 
 TEST_F(LogTest, FileThatCannotBeOpenedIsOneWarningAndTheRunGoesOn) {
