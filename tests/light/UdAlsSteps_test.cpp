@@ -55,6 +55,17 @@ TEST_F(UdAlsSteps, AreForDevicesWithTheSensorAndTheClassicFamily) {
 
 // Files of a step.
 
+TEST_F(UdAlsSteps, OnlyALuxStepCanHaveALabelInItsLog) {
+  EXPECT_EQ(run({"-s", "1", "100", "4000", "d65", "128"}).result, 0);
+  EXPECT_THAT(content("persist/sensors/als.csv"), EndsWith(",d65,128.000000\n"));
+  EXPECT_EQ(run({"-s", "1", "white", "50"}).result, 0);
+  EXPECT_THAT(content("persist/sensors/als_pattern_cal.csv"), EndsWith(",k,50.000000\n"));
+  EXPECT_EQ(run({"-s", "1", "pwm", "100", "3", "128"}).result, 0);
+  EXPECT_THAT(content("persist/sensors/als_pwm_cal.csv"), EndsWith(",k,128.000000\n"));
+  EXPECT_EQ(run({"-s", "1", "calgain", "100", "3"}).result, 0);
+  EXPECT_THAT(content("persist/sensors/als_gain_cal.csv"), EndsWith(",k,0.000000\n"));
+}
+
 TEST_F(UdAlsSteps, AStepWithoutLogFolderStillMakesItsRecord) {
   std::filesystem::remove_all(folder.path() / "persist");
   const Captured captured = run({"-s", "2", "100"});
