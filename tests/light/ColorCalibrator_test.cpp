@@ -2,6 +2,7 @@
 // of the command are golden cases.
 #include "light/ColorCalibrator.h"
 
+#include <cmath>
 #include <cstdlib>
 #include <filesystem>
 #include <limits>
@@ -157,16 +158,51 @@ TEST_F(ColorTest, AGainThatChangesBehindTheLastSampleNeededChangesNothing) {
   EXPECT_THAT(captured.out, HasSubstr("LUX_MEAN:      500.000000\n"));
 }
 
-TEST_F(ColorTest, AMeanThatIsNotFiniteIsNotSaved) {
+TEST_F(ColorTest, AMeanThatCountsAndIsNotFiniteIsNotSaved) {
   for (const float odd : {kNan, std::numeric_limits<float>::infinity()}) {
-    script->sensors[0].reading = [odd](int index) { return reading(index, odd); };
-    const Captured captured = run({"color", "-c", "500", "4000"});
-    EXPECT_EQ(captured.result, -22);
-    EXPECT_THAT(captured.err, HasSubstr("is not a finite number"));
-    EXPECT_THAT(captured.out, HasSubstr("Calibration failed.\n"));
-    EXPECT_THAT(captured.out, Not(HasSubstr("Saving")));
+    for (const std::size_t value : {color_reading::kClear, color_reading::kRed, color_reading::kBlue}) {
+      script->sensors[0].reading = [odd, value](int index) {
+        std::vector<float> values = reading(index, 4000);
+        values[value] = odd;
+        return values;
+      };
+      const Captured captured = run({"color", "-c", "500", "4000"});
+      EXPECT_EQ(captured.result, -22);
+      EXPECT_THAT(captured.err, HasSubstr("is not a finite number"));
+      EXPECT_THAT(captured.out, HasSubstr("Calibration failed.\n"));
+      EXPECT_THAT(captured.out, Not(HasSubstr("Saving")));
+      EXPECT_EQ(data(), "(none)");
+    }
+    script->sensors[0].reading = [](int index) { return reading(index, 4000); };
+    script->sensors[1].reading = [odd](int index) { return reading(index, odd); };
+    EXPECT_EQ(run({"color", "-c", "500", "4000"}).result, -22);
     EXPECT_EQ(data(), "(none)");
+    script->sensors[1].reading = [](int index) { return reading(index, 500); };
   }
+}
+
+TEST_F(ColorTest, UnderTheInfraredLampThereMayBeNoColorTemperature) {
+  for (const float odd : {kNan, -kNan, std::numeric_limits<float>::infinity()}) {
+    script->sensors[0].reading = [odd](int index) { return reading(index, odd); };
+    const Captured captured = run({"color", "-c", "-s", "2"});
+    EXPECT_EQ(captured.result, 0) << captured.err;
+    EXPECT_THAT(captured.out,
+                HasSubstr(std::isnan(odd) ? "CCT_MEAN:             nan\n" : "CCT_MEAN:             inf\n"));
+    EXPECT_THAT(captured.out, HasSubstr("Please proceed to the next step.\n"));
+    EXPECT_EQ(data().size(), 36U);
+  }
+  // Nothing that is computed depends on it.
+  script->sensors[0].reading = [](int index) { return reading(index, kNan); };
+  EXPECT_EQ(run({"color", "-s", "2", "1000", "3000"}).result, 0);
+  script->sensors[0].reading = [](int index) {
+    std::vector<float> values = reading(index, kNan);
+    values[color_reading::kBlue] = 300;
+    return values;
+  };
+  const Captured last = run({"color", "-s", "2", "-w", "1000", "5000"});
+  EXPECT_EQ(last.result, 0) << last.err;
+  EXPECT_THAT(last.out, HasSubstr("BR_FIT:       2000.000000    2000.000000\n"));
+  EXPECT_THAT(last.out, HasSubstr("Calibration succeeded.\n"));
 }
 
 TEST_F(ColorTest, ReadingsWhoseInfraredIsNotANumberDoNotCount) {
