@@ -123,4 +123,11 @@ TEST(ConvertToCct, StopsAtAReadingWithoutRed) {
   }
 }
 
+TEST(ConvertToCct, ARedThatIsNotANumberShowsInTheResult) {
+  std::vector<Sample> readings{reading(kNan, 100), reading(200, 100)};
+  EXPECT_TRUE(convertToCct(1000, 4000, &readings));
+  EXPECT_TRUE(std::isnan(readings[0].values[0]));
+  EXPECT_EQ(readings[1].values[0], 3000);
+}
+
 }  // namespace
