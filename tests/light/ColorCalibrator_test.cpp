@@ -5,7 +5,9 @@
 #include <cmath>
 #include <cstdlib>
 #include <filesystem>
+#include <functional>
 #include <limits>
+#include <string_view>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -294,6 +296,37 @@ TEST_F(ColorTest, LinksInThePlaceOfTheFilesAreNotFollowed) {
   EXPECT_EQ(run({"color", "-C"}).result, 0);
   EXPECT_FALSE(std::filesystem::is_symlink(dataFile));
   EXPECT_EQ(support::readFile(victim), "precious");
+}
+
+// Verification.
+
+TEST_F(ColorTest, OnlyGroupsOfAVersionCanBeVerified) {
+  const auto verify = [this](const char* group, const std::function<void(sns_registry_data_item*)>& version) {
+    for (const char* const each : {kAlsGroup, kColorGroup}) {
+      sns_registry_data data;
+      addFloatItem(&data, each == kAlsGroup ? "scale" : "ratio_coef0", 1, 1);
+      addFloatItem(&data, "ratio_coef1", 7998, 1);
+      auto* const item = data.add_items();
+      item->set_name("version");
+      item->set_sint(1);
+      if (std::string_view(each) == group) version(item);
+      script->registry[each] = data;
+    }
+    return run({"color", "-s", "2", "-v", "0.001", "500", "4000"});
+  };
+  for (const char* const group : {kAlsGroup, kColorGroup}) {
+    const Captured first = verify(group, [](auto* version) { version->set_sint(1); });
+    EXPECT_EQ(first.result, 0) << first.err;
+    EXPECT_THAT(first.out, HasSubstr("CCT_MEAN:    4000.000000\n"));
+    for (const auto& odd : std::vector<std::function<void(sns_registry_data_item*)>>{
+             [](auto* version) { version->set_sint(0); }, [](auto* version) { version->set_sint(-4); },
+             [](auto* version) { version->set_flt(4); }, [](auto* version) { version->set_name("other"); }}) {
+      const Captured captured = verify(group, odd);
+      EXPECT_EQ(captured.result, -22);
+      EXPECT_EQ(captured.err, "ERROR: Cannot verify with old calibration\n");
+      EXPECT_THAT(captured.out, HasSubstr("Saving data to file...\nVerification failed.\n"));
+    }
+  }
 }
 
 // What the records come to.
