@@ -241,6 +241,30 @@ TEST_F(UdAlsSteps, ASensorThatDoesNotConfirmIsWarnedAbout) {
 
 // Verification.
 
+TEST_F(UdAlsSteps, VerificationOfOtherStepsCollectsInSilence) {
+  globals.quiet = false;
+  const Captured captured = run({"-s", "1", "-v", "5", "white", "20"});
+  EXPECT_EQ(captured.result, 0) << captured.err;
+  EXPECT_EQ(captured.out,
+            "Searching for ambient light sensor...\nDisplay pattern noise calibration...\n"
+            "Collecting samples...\nSaving data to file...\n");
+  EXPECT_EQ(records().size(), 1U);
+
+  script->sensors[0].reading = nullptr;
+  const Captured silent = run({"-s", "1", "-v", "5", "white", "20"});
+  EXPECT_EQ(silent.result, -110);
+  EXPECT_THAT(silent.out, EndsWith("Collecting samples...\n"));
+}
+
+TEST_F(UdAlsSteps, VerificationGoesBeforeWriting) {
+  for (const char* option : {"-w", "-W"}) {
+    const Captured captured = run({"-s", "1", option, "-v", "5", "50"});
+    EXPECT_EQ(captured.result, 0) << captured.err;
+    EXPECT_THAT(captured.out, EndsWith("Verification succeeded.\n"));
+    EXPECT_EQ(writes(), 0);
+  }
+}
+
 TEST_F(UdAlsSteps, VerificationAppliesTheCorrectionFactorToTheLuxAlone) {
   addFloatItem(&script->registry[kGroup], "corr_factor", 2, 1);
   globals.quiet = false;
