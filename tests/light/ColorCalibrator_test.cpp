@@ -286,6 +286,18 @@ TEST_F(ColorTest, OnAFullDiskTheEarlierRecordsStay) {
   EXPECT_EQ(support::readFile(logFile), log);
 }
 
+TEST_F(ColorTest, AWorkingFileThatCannotBeOpenedLeavesTheLinesOfTheLogAndWhatWasReadBefore) {
+  std::filesystem::create_directory(dataFile);
+  EXPECT_EQ(run({"color", "-c", "500", "4000"}).result, -1);
+  EXPECT_EQ(support::readFile(logFile),
+            std::string(kColorLogHeader) +
+                "500.000000,4000.000000,1000.000000,200.000000,300.000000,100.000000,50.000000,4.000000\n");
+  std::filesystem::remove(dataFile);
+  std::vector<SampleData> records{kDay};
+  EXPECT_EQ(capture([&] { return calibrator->LoadData(&records); }).result, -1);
+  EXPECT_THAT(records, ElementsAre(kDay));
+}
+
 TEST_F(ColorTest, LinksInThePlaceOfTheFilesAreNotFollowed) {
   const std::string victim = folder.path() / "victim";
   ASSERT_TRUE(support::writeFile(victim, "precious"));

@@ -90,6 +90,10 @@ TEST_F(UdAlsSteps, AStepWithoutDataFolderFails) {
   EXPECT_EQ(captured.result, -1);
   EXPECT_EQ(captured.err, "ERROR: Failed to open als calibration data file\n");
   EXPECT_THAT(captured.out, EndsWith("Saving data to file...\nCalibration failed.\n"));
+  // The samples were logged before, and stay so.
+  EXPECT_THAT(
+      content("persist/sensors/als.csv"),
+      EndsWith(",10.000000,20.000000,30.000000,40.000000,5.000000,8.000000,1000.000000,k,0.000000\n"));
 }
 
 TEST_F(UdAlsSteps, AFullDiskIsSaidAndLeavesNoHalfRecord) {
@@ -141,6 +145,7 @@ TEST_F(UdAlsSteps, LoadingTellsWhatIsWrongWithTheFile) {
   std::filesystem::remove(folder.path() / kDataFile);
   EXPECT_EQ(load().result, -1);
   EXPECT_EQ(load().err, "ERROR: Failed to open calibration data file\n");
+  EXPECT_EQ(read.size(), 2U) << "what was read before stays";
 
   std::filesystem::create_directory(folder.path() / kDataFile);
   EXPECT_EQ(load().result, kShortFile);
