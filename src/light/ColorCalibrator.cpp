@@ -241,10 +241,11 @@ int ColorCalibrator::collectRecord() {
   const int result = collect();
   if (result != ssc::kOk) return result;
   const SampleData means = colorMeans(samples[alsSuid], samples[colorSuid]);
-  // Means that are not complete have no lines of their own: SaveData refuses them.
-  if (!isVerifying() && means.size() == color_means::kCount) printMeans(means);
+  // Means that are not complete have no lines of their own, and are refused.
+  if (means.size() < color_means::kCount) return SaveData(means);
+  if (!isVerifying()) printMeans(means);
   // Kept, such a record would spoil the calibration of all the others.
-  const int finite = RequireFinite("A mean of the color sensor or its light sensor", means.toVector());
+  const int finite = RequireFinite("A mean of the color sensor or its light sensor", meansThatCount(means));
   return finite == ssc::kOk ? SaveData(means) : finite;
 }
 

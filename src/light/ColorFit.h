@@ -36,5 +36,6 @@ using ColorPoints = std::vector<std::pair<float, float>>;
 [[nodiscard]] ColorPoints blueClearPoints(const std::vector<SampleData>& records);
 
 /// Makes the first value of each reading the color temperature q0 + q1 · B / R. False at the first whose R is
-/// not above 0: those before it are converted, the others are not.
+/// 0 or less: those before it are converted, the others are not. An R that is not a number gives a color
+/// temperature that is none either.
 [[nodiscard]] bool convertToCct(float q0, float q1, std::vector<Sample>* readings);

@@ -35,6 +35,11 @@ SampleData colorMeans(const std::vector<Sample>& light, const std::vector<Sample
   return means;
 }
 
+std::vector<float> meansThatCount(const SampleData& means) {
+  using namespace color_means;
+  return {means[kLux], means[kClear], means[kRed], means[kBlue], means[kIr], means[kGain]};
+}
+
 SampleData colorRecord(float referenceLux, float referenceCct, const SampleData& means) {
   SampleData record{referenceLux, referenceCct};
   for (std::size_t i = 0; i < color_means::kCount; ++i) {

@@ -41,6 +41,10 @@ enum Index : std::size_t { kLux, kCct, kClear, kRed, kGreen, kBlue, kIr, kGain, 
 /// are left out: fewer than color_means::kCount values.
 [[nodiscard]] SampleData colorMeans(const std::vector<Sample>& light, const std::vector<Sample>& color);
 
+/// Those of the means, of which there are color_means::kCount, that a calibration computes from. Not the
+/// color temperature, since light without a color has none, and not the green.
+[[nodiscard]] std::vector<float> meansThatCount(const SampleData& means);
+
 /// A record of the working file: the reference, and the means without the green, which no fit uses.
 namespace color_record {
 enum Index : std::size_t {

@@ -46,7 +46,7 @@ struct UdAlsArguments {
   float referenceCct = kNotGiven;      ///< K
   std::string displayColor;            ///< a label for the log; empty: none
   float brightness = kNotGiven;        ///< of the display, 0 to 255
-  std::string patternColor;            ///< "white", "red", "green" or "blue"
+  std::string patternColor;            ///< "white", "red", "green" or "blue"; kept, not written down
   std::int32_t gain = -1;              ///< setting 0 to 11; each is twice the one before
   float integrationTime = kNotGiven;   ///< µs
   float alsDelay = kNotGiven;          ///< ms from the display's refresh to the integration

@@ -36,9 +36,9 @@ std::string udAlsRecord(const UdAlsArguments& arguments, float delay, const Samp
 }
 
 FileResult readUdAlsRecords(const std::string& path, std::vector<SampleData>* records) {
-  records->clear();
   std::string content;
   const FileResult read = readWholeFile(path, kMaxUdAlsDataFileBytes, &content);
+  if (read == FileResult::kCannotOpen) return read;
   // What came before an error is kept, and so are the records before one that is torn.
   const FileResult split = splitFloatRecords(content, kUdAlsRecordValues, records);
   return read == FileResult::kOk ? split : read;

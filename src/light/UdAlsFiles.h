@@ -52,5 +52,6 @@ inline constexpr std::size_t kMaxUdAlsDataFileBytes = std::size_t{16} * 1024 * 1
 
 /// The record of a step: 48 bytes in the machine's byte order.
 [[nodiscard]] std::string udAlsRecord(const UdAlsArguments& arguments, float delay, const SampleData& means);
-/// All records that are whole: kOk, or what keeps the file from being read to its end.
+/// All records that are whole: kOk, or what keeps the file from being read to its end. Of a file that cannot
+/// be opened nothing is known: `records` is then left alone.
 [[nodiscard]] FileResult readUdAlsRecords(const std::string& path, std::vector<SampleData>* records);

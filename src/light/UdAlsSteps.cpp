@@ -109,10 +109,9 @@ float UdAlsCalibrator::delayOfStep() const {
 int UdAlsCalibrator::SaveDataToCsv(const char* path, const SampleData& sample) {
   const int result = requireValues(sample);
   if (result != ssc::kOk) return result;
-  // What the log says of the display is what the record says.
-  if (words_.displayColor.empty()) {
-    words_.displayColor = words_.patternColor.empty() ? kNoColor : words_.patternColor;
-  }
+  // What the log says of the display is what the record says. The colour of a screen pattern is no label: its
+  // log has the same "k".
+  if (words_.displayColor.empty()) words_.displayColor = kNoColor;
   if (words_.brightness < 0) words_.brightness = 0;
   const std::string line = udAlsLogLine(words_, sample);
   // With -r each sample starts the log anew, so that only the last one stays: the means are in the working

@@ -2,9 +2,12 @@
 // of the command are golden cases.
 #include "light/ColorCalibrator.h"
 
+#include <cmath>
 #include <cstdlib>
 #include <filesystem>
+#include <functional>
 #include <limits>
+#include <string_view>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -157,16 +160,51 @@ TEST_F(ColorTest, AGainThatChangesBehindTheLastSampleNeededChangesNothing) {
   EXPECT_THAT(captured.out, HasSubstr("LUX_MEAN:      500.000000\n"));
 }
 
-TEST_F(ColorTest, AMeanThatIsNotFiniteIsNotSaved) {
+TEST_F(ColorTest, AMeanThatCountsAndIsNotFiniteIsNotSaved) {
   for (const float odd : {kNan, std::numeric_limits<float>::infinity()}) {
-    script->sensors[0].reading = [odd](int index) { return reading(index, odd); };
-    const Captured captured = run({"color", "-c", "500", "4000"});
-    EXPECT_EQ(captured.result, -22);
-    EXPECT_THAT(captured.err, HasSubstr("is not a finite number"));
-    EXPECT_THAT(captured.out, HasSubstr("Calibration failed.\n"));
-    EXPECT_THAT(captured.out, Not(HasSubstr("Saving")));
+    for (const std::size_t value : {color_reading::kClear, color_reading::kRed, color_reading::kBlue}) {
+      script->sensors[0].reading = [odd, value](int index) {
+        std::vector<float> values = reading(index, 4000);
+        values[value] = odd;
+        return values;
+      };
+      const Captured captured = run({"color", "-c", "500", "4000"});
+      EXPECT_EQ(captured.result, -22);
+      EXPECT_THAT(captured.err, HasSubstr("is not a finite number"));
+      EXPECT_THAT(captured.out, HasSubstr("Calibration failed.\n"));
+      EXPECT_THAT(captured.out, Not(HasSubstr("Saving")));
+      EXPECT_EQ(data(), "(none)");
+    }
+    script->sensors[0].reading = [](int index) { return reading(index, 4000); };
+    script->sensors[1].reading = [odd](int index) { return reading(index, odd); };
+    EXPECT_EQ(run({"color", "-c", "500", "4000"}).result, -22);
     EXPECT_EQ(data(), "(none)");
+    script->sensors[1].reading = [](int index) { return reading(index, 500); };
   }
+}
+
+TEST_F(ColorTest, UnderTheInfraredLampThereMayBeNoColorTemperature) {
+  for (const float odd : {kNan, -kNan, std::numeric_limits<float>::infinity()}) {
+    script->sensors[0].reading = [odd](int index) { return reading(index, odd); };
+    const Captured captured = run({"color", "-c", "-s", "2"});
+    EXPECT_EQ(captured.result, 0) << captured.err;
+    EXPECT_THAT(captured.out,
+                HasSubstr(std::isnan(odd) ? "CCT_MEAN:             nan\n" : "CCT_MEAN:             inf\n"));
+    EXPECT_THAT(captured.out, HasSubstr("Please proceed to the next step.\n"));
+    EXPECT_EQ(data().size(), 36U);
+  }
+  // Nothing that is computed depends on it.
+  script->sensors[0].reading = [](int index) { return reading(index, kNan); };
+  EXPECT_EQ(run({"color", "-s", "2", "1000", "3000"}).result, 0);
+  script->sensors[0].reading = [](int index) {
+    std::vector<float> values = reading(index, kNan);
+    values[color_reading::kBlue] = 300;
+    return values;
+  };
+  const Captured last = run({"color", "-s", "2", "-w", "1000", "5000"});
+  EXPECT_EQ(last.result, 0) << last.err;
+  EXPECT_THAT(last.out, HasSubstr("BR_FIT:       2000.000000    2000.000000\n"));
+  EXPECT_THAT(last.out, HasSubstr("Calibration succeeded.\n"));
 }
 
 TEST_F(ColorTest, ReadingsWhoseInfraredIsNotANumberDoNotCount) {
@@ -248,6 +286,18 @@ TEST_F(ColorTest, OnAFullDiskTheEarlierRecordsStay) {
   EXPECT_EQ(support::readFile(logFile), log);
 }
 
+TEST_F(ColorTest, AWorkingFileThatCannotBeOpenedLeavesTheLinesOfTheLogAndWhatWasReadBefore) {
+  std::filesystem::create_directory(dataFile);
+  EXPECT_EQ(run({"color", "-c", "500", "4000"}).result, -1);
+  EXPECT_EQ(support::readFile(logFile),
+            std::string(kColorLogHeader) +
+                "500.000000,4000.000000,1000.000000,200.000000,300.000000,100.000000,50.000000,4.000000\n");
+  std::filesystem::remove(dataFile);
+  std::vector<SampleData> records{kDay};
+  EXPECT_EQ(capture([&] { return calibrator->LoadData(&records); }).result, -1);
+  EXPECT_THAT(records, ElementsAre(kDay));
+}
+
 TEST_F(ColorTest, LinksInThePlaceOfTheFilesAreNotFollowed) {
   const std::string victim = folder.path() / "victim";
   ASSERT_TRUE(support::writeFile(victim, "precious"));
@@ -258,6 +308,37 @@ TEST_F(ColorTest, LinksInThePlaceOfTheFilesAreNotFollowed) {
   EXPECT_EQ(run({"color", "-C"}).result, 0);
   EXPECT_FALSE(std::filesystem::is_symlink(dataFile));
   EXPECT_EQ(support::readFile(victim), "precious");
+}
+
+// Verification.
+
+TEST_F(ColorTest, OnlyGroupsOfAVersionCanBeVerified) {
+  const auto verify = [this](const char* group, const std::function<void(sns_registry_data_item*)>& version) {
+    for (const char* const each : {kAlsGroup, kColorGroup}) {
+      sns_registry_data data;
+      addFloatItem(&data, each == kAlsGroup ? "scale" : "ratio_coef0", 1, 1);
+      addFloatItem(&data, "ratio_coef1", 7998, 1);
+      auto* const item = data.add_items();
+      item->set_name("version");
+      item->set_sint(1);
+      if (std::string_view(each) == group) version(item);
+      script->registry[each] = data;
+    }
+    return run({"color", "-s", "2", "-v", "0.001", "500", "4000"});
+  };
+  for (const char* const group : {kAlsGroup, kColorGroup}) {
+    const Captured first = verify(group, [](auto* version) { version->set_sint(1); });
+    EXPECT_EQ(first.result, 0) << first.err;
+    EXPECT_THAT(first.out, HasSubstr("CCT_MEAN:    4000.000000\n"));
+    for (const auto& odd : std::vector<std::function<void(sns_registry_data_item*)>>{
+             [](auto* version) { version->set_sint(0); }, [](auto* version) { version->set_sint(-4); },
+             [](auto* version) { version->set_flt(4); }, [](auto* version) { version->set_name("other"); }}) {
+      const Captured captured = verify(group, odd);
+      EXPECT_EQ(captured.result, -22);
+      EXPECT_EQ(captured.err, "ERROR: Cannot verify with old calibration\n");
+      EXPECT_THAT(captured.out, HasSubstr("Saving data to file...\nVerification failed.\n"));
+    }
+  }
 }
 
 // What the records come to.

@@ -75,6 +75,11 @@ TEST(BmScale, WeighsTheLuxByTheClearLightWithoutRed) {
   EXPECT_FALSE(std::signbit(meanBmScale({record(0, 0, 0)})));
 }
 
+TEST(BmScale, MultipliesBeforeItDivides) {
+  EXPECT_EQ(meanBmScale({record(15, 11, 0)}), 1000.0F / (4.0F * 500.0F / 15.0F));
+  ASSERT_NE(1000.0F / (4.0F * 500.0F / 15.0F), 1000.0F / (4.0F / 15.0F * 500.0F));
+}
+
 TEST(ColorPoints, OfBlueAndRedNeedRed) {
   EXPECT_THAT(blueRedPoints({record(1000, 200, 100), record(1000, 0, 100), record(1000, -1, 100)}),
               ElementsAre(Pair(0.5F, 4000.0F)));
@@ -113,6 +118,13 @@ TEST(ConvertToCct, PutsTheLineInTheFirstValue) {
   EXPECT_EQ(readings[1].values[1], 1000);
 }
 
+TEST(ConvertToCct, MultipliesBeforeItDivides) {
+  std::vector<Sample> readings{reading(49, 1)};
+  EXPECT_TRUE(convertToCct(0, 7, &readings));
+  EXPECT_EQ(readings[0].values[0], 7.0F / 49.0F);
+  ASSERT_NE(7.0F / 49.0F, 7.0F * (1.0F / 49.0F));
+}
+
 TEST(ConvertToCct, StopsAtAReadingWithoutRed) {
   for (const float red : {0.0F, -5.0F}) {
     std::vector<Sample> readings{reading(200, 100), reading(red, 100), reading(200, 100)};
@@ -121,6 +133,13 @@ TEST(ConvertToCct, StopsAtAReadingWithoutRed) {
     EXPECT_EQ(readings[1].values[0], 7);
     EXPECT_EQ(readings[2].values[0], 7);
   }
+}
+
+TEST(ConvertToCct, ARedThatIsNotANumberShowsInTheResult) {
+  std::vector<Sample> readings{reading(kNan, 100), reading(200, 100)};
+  EXPECT_TRUE(convertToCct(1000, 4000, &readings));
+  EXPECT_TRUE(std::isnan(readings[0].values[0]));
+  EXPECT_EQ(readings[1].values[0], 3000);
 }
 
 }  // namespace

@@ -61,6 +61,10 @@ TEST(ColorMeans, NotANumberIsThePlainOne) {
   EXPECT_FALSE(std::signbit(means[color_means::kCct]));
 }
 
+TEST(ColorMeans, ThatCountAreAllButTheColorTemperatureAndTheGreen) {
+  EXPECT_THAT(meansThatCount({1, 2, 3, 4, 5, 6, 7, 8}), ElementsAre(1, 3, 4, 6, 7, 8));
+}
+
 TEST(ColorRecord, IsTheReferenceAndTheMeansWithoutTheGreen) {
   EXPECT_THAT(colorRecord(500, 2800, {1, 2, 3, 4, 5, 6, 7, 8}), ElementsAre(500, 2800, 1, 2, 3, 4, 6, 7, 8));
 }

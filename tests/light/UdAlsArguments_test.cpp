@@ -277,6 +277,7 @@ TEST(UdAlsWords, WordsWithoutAMeaningAreNamed) {
   EXPECT_EQ(parse({"trigger", ""}).error, "Invalid argument ''");
   EXPECT_EQ(parse({"autogain", "5"}).error, "Invalid argument '5'");
   EXPECT_EQ(parse({"100", "4000", "d65", "128", "more"}).error, "Invalid argument 'more'");
+  EXPECT_EQ(parse({"100", "4000", "d65", "0", "more"}).error, "Invalid argument 'more'");
 }
 
 struct NumberCase {

@@ -88,10 +88,14 @@ TEST_F(UdAlsRecords, OfAnEmptyFileAreNone) {
   EXPECT_THAT(records, SizeIs(0));
 }
 
-TEST_F(UdAlsRecords, OfNoFileOrAFolderAreNone) {
+TEST_F(UdAlsRecords, ReadBeforeStayWhenTheFileCannotBeOpened) {
   EXPECT_EQ(readUdAlsRecords(path, &records), FileResult::kCannotOpen);
-  EXPECT_THAT(records, SizeIs(0));
+  EXPECT_THAT(records, SizeIs(1));
+}
+
+TEST_F(UdAlsRecords, OfAFolderAreNone) {
   EXPECT_EQ(readUdAlsRecords(folder.path(), &records), FileResult::kFailed);
+  EXPECT_THAT(records, SizeIs(0));
 }
 
 TEST_F(UdAlsRecords, OfAHugeFileAreNotTakenIn) {

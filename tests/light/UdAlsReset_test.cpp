@@ -110,6 +110,18 @@ TEST_F(UdAlsReset, OfAnotherDeviceAdvancesTheClearCoefficientsVersionOnly) {
   }
 }
 
+TEST_F(UdAlsReset, OfAnotherDeviceWantsTheClearCoefficientToBeThere) {
+  giveGroup();
+  auto* const items = script->registry[kGroup].mutable_items();
+  for (int i = items->size(); i-- > 0;) {
+    if (items->Get(i).name() == "c_coeff") items->DeleteSubrange(i, 1);
+  }
+  const Captured captured = reset(DeviceType::o1v1);
+  EXPECT_EQ(captured.result, -22);
+  EXPECT_EQ(captured.err, "ERROR: Invalid registry; missing \"c_coeff\"\n");
+  EXPECT_EQ(stored("version").version(), 6);
+}
+
 TEST_F(UdAlsReset, NamesTheFirstItemThatIsMissingAndWritesNothing) {
   for (const Expected& row : kItems) {
     giveGroup();

@@ -55,6 +55,17 @@ TEST_F(UdAlsSteps, AreForDevicesWithTheSensorAndTheClassicFamily) {
 
 // Files of a step.
 
+TEST_F(UdAlsSteps, OnlyALuxStepCanHaveALabelInItsLog) {
+  EXPECT_EQ(run({"-s", "1", "100", "4000", "d65", "128"}).result, 0);
+  EXPECT_THAT(content("persist/sensors/als.csv"), EndsWith(",d65,128.000000\n"));
+  EXPECT_EQ(run({"-s", "1", "white", "50"}).result, 0);
+  EXPECT_THAT(content("persist/sensors/als_pattern_cal.csv"), EndsWith(",k,50.000000\n"));
+  EXPECT_EQ(run({"-s", "1", "pwm", "100", "3", "128"}).result, 0);
+  EXPECT_THAT(content("persist/sensors/als_pwm_cal.csv"), EndsWith(",k,128.000000\n"));
+  EXPECT_EQ(run({"-s", "1", "calgain", "100", "3"}).result, 0);
+  EXPECT_THAT(content("persist/sensors/als_gain_cal.csv"), EndsWith(",k,0.000000\n"));
+}
+
 TEST_F(UdAlsSteps, AStepWithoutLogFolderStillMakesItsRecord) {
   std::filesystem::remove_all(folder.path() / "persist");
   const Captured captured = run({"-s", "2", "100"});
@@ -79,6 +90,10 @@ TEST_F(UdAlsSteps, AStepWithoutDataFolderFails) {
   EXPECT_EQ(captured.result, -1);
   EXPECT_EQ(captured.err, "ERROR: Failed to open als calibration data file\n");
   EXPECT_THAT(captured.out, EndsWith("Saving data to file...\nCalibration failed.\n"));
+  // The samples were logged before, and stay so.
+  EXPECT_THAT(
+      content("persist/sensors/als.csv"),
+      EndsWith(",10.000000,20.000000,30.000000,40.000000,5.000000,8.000000,1000.000000,k,0.000000\n"));
 }
 
 TEST_F(UdAlsSteps, AFullDiskIsSaidAndLeavesNoHalfRecord) {
@@ -130,6 +145,7 @@ TEST_F(UdAlsSteps, LoadingTellsWhatIsWrongWithTheFile) {
   std::filesystem::remove(folder.path() / kDataFile);
   EXPECT_EQ(load().result, -1);
   EXPECT_EQ(load().err, "ERROR: Failed to open calibration data file\n");
+  EXPECT_EQ(read.size(), 2U) << "what was read before stays";
 
   std::filesystem::create_directory(folder.path() / kDataFile);
   EXPECT_EQ(load().result, kShortFile);
@@ -229,6 +245,30 @@ TEST_F(UdAlsSteps, ASensorThatDoesNotConfirmIsWarnedAbout) {
 }
 
 // Verification.
+
+TEST_F(UdAlsSteps, VerificationOfOtherStepsCollectsInSilence) {
+  globals.quiet = false;
+  const Captured captured = run({"-s", "1", "-v", "5", "white", "20"});
+  EXPECT_EQ(captured.result, 0) << captured.err;
+  EXPECT_EQ(captured.out,
+            "Searching for ambient light sensor...\nDisplay pattern noise calibration...\n"
+            "Collecting samples...\nSaving data to file...\n");
+  EXPECT_EQ(records().size(), 1U);
+
+  script->sensors[0].reading = nullptr;
+  const Captured silent = run({"-s", "1", "-v", "5", "white", "20"});
+  EXPECT_EQ(silent.result, -110);
+  EXPECT_THAT(silent.out, EndsWith("Collecting samples...\n"));
+}
+
+TEST_F(UdAlsSteps, VerificationGoesBeforeWriting) {
+  for (const char* option : {"-w", "-W"}) {
+    const Captured captured = run({"-s", "1", option, "-v", "5", "50"});
+    EXPECT_EQ(captured.result, 0) << captured.err;
+    EXPECT_THAT(captured.out, EndsWith("Verification succeeded.\n"));
+    EXPECT_EQ(writes(), 0);
+  }
+}
 
 TEST_F(UdAlsSteps, VerificationAppliesTheCorrectionFactorToTheLuxAlone) {
   addFloatItem(&script->registry[kGroup], "corr_factor", 2, 1);
