@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+#include <unistd.h>
+
 #include "framework/LowerCase.h"
 #include "ssc/AttrUtil.h"
 #include "ssc/Log.h"
@@ -13,6 +15,9 @@ namespace {
 
 constexpr std::uint32_t kToleratedReconnections = 3;
 constexpr std::chrono::seconds kAnswerTime{3};
+// What a sample takes while it is kept: itself, what is computed for it, and room that its list has not used
+// yet.
+constexpr double kBytesPerSample = 80;
 
 /// Whether the sensor's stream type is `streamType` and, if so, the package that its name stands for. Results
 /// as of the library.
@@ -201,6 +206,20 @@ std::vector<std::string> Calibrator::GetAllConfigRequests() const {
 void Calibrator::DisableAllSensors() {
   // Results do not matter: the hub forgets a client's requests when it goes.
   for (const auto& entry : sensorInfo) SendRequest(MakeDisableRequest(entry.first));
+}
+
+int Calibrator::requireMemory(std::chrono::duration<double> period) const {
+  if (!keepsSamples) return ssc::kOk;
+  double samplesPerSecond = 0;
+  for (const auto& entry : sensorInfo)
+    samplesPerSecond += std::max(0.0, static_cast<double>(entry.second.rate));
+  const double needed = period.count() * samplesPerSecond * kBytesPerSample;
+  const double installed =
+      static_cast<double>(::sysconf(_SC_PHYS_PAGES)) * static_cast<double>(::sysconf(_SC_PAGESIZE));
+  if (needed <= installed) return ssc::kOk;
+  ssc::log(ssc::kLogError, "The samples of %.0f seconds take %.0f MB, more memory than there is",
+           period.count(), needed / 1e6);
+  return ssc::kInvalid;
 }
 
 std::vector<std::string> Calibrator::beginCollection() {

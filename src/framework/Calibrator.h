@@ -120,12 +120,15 @@ class Calibrator : public ssc::Client {
 
   /// Streams all sensors for `period` or until a handler ends it, then disables them and, when asked, prints
   /// the samples. 0 when a handler ended it; ssc::kTimedOut when the period has passed, which is the normal
-  /// end of most; ssc::kMalformed after an event that does not parse; ssc::kConnectionLost; or what sending
-  /// returned.
+  /// end of most; ssc::kMalformed after an event that does not parse; ssc::kConnectionLost; what sending
+  /// returned; or ssc::kInvalid, after a level-0 message and before anything is collected, for a period whose
+  /// samples no memory could hold.
   template <class Rep, class Period>
   [[nodiscard]] int CollectSamples(const std::chrono::duration<Rep, Period>& period, bool print) {
+    int result = requireMemory(period);
+    if (result != ssc::kOk) return result;
     const std::vector<std::string> requests = beginCollection();
-    const int result = SendRequestsAndWait(requests, period, nullptr);
+    result = SendRequestsAndWait(requests, period, nullptr);
     endCollection(result, print);
     return result;
   }
@@ -183,6 +186,7 @@ class Calibrator : public ssc::Client {
   /// Level of what says, beside a command's own lines, why a collection failed. A command that is to say no
   /// more than its own lines traces it.
   int hubTroubleLevel = ssc::kLogWarn;
+  bool keepsSamples = true;  ///< false in a command that only adds its samples up
   bool dryRun = false;
   bool quiet = false;
   DeviceType deviceType = DeviceType::o1v1;
@@ -192,6 +196,7 @@ class Calibrator : public ssc::Client {
   bool awaitsAnswer = false;                        ///< guarded by mutex: AskSensor is waiting
 
  private:
+  [[nodiscard]] int requireMemory(std::chrono::duration<double> period) const;
   std::vector<std::string> beginCollection();
   void endCollection(int result, bool print);
   [[nodiscard]] bool endsWait(const ssc::SensorUid& suid, const Event& event);

@@ -2,8 +2,6 @@
 
 #include <cmath>
 
-#include <unistd.h>
-
 #include "framework/CommandOptions.h"
 #include "framework/ParseNumber.h"
 #include "ssc/Log.h"
@@ -66,9 +64,6 @@ constexpr float kTemperatureRateHz = 1.0F;
 constexpr std::size_t kVectorAxes = 3;
 constexpr std::size_t kPressureAxes = 1;
 constexpr int kValuesWithRaw = 6;  // three calibrated, then three raw ones
-
-// What a sample takes while it is kept: itself, its temperature, and room that its list has not used yet.
-constexpr double kBytesPerSample = 80;
 
 bool parsePositive(const char* text, float* value) {
   return parseFloat(text, value) == ssc::kOk && *value > 0 && std::isfinite(*value);
@@ -275,24 +270,9 @@ int ImuThermalCalibrator::measureAndStore() {
 }
 
 int ImuThermalCalibrator::collect() {
-  int result = requireMemory();
-  if (result != ssc::kOk) return result;
   const std::chrono::seconds duration(durationSeconds_);
   if (!quiet) progress_.Start(connection->clock().now(), duration);
-  result = CollectSamples(duration, true);
+  const int result = CollectSamples(duration, true);
   progress_.End();
   return RequireCollected(result);
-}
-
-/// A duration that no handset could keep the samples of is refused before it is begun, not after days.
-int ImuThermalCalibrator::requireMemory() const {
-  double rateHz = 0;
-  for (const auto& entry : sensorInfo) rateHz += static_cast<double>(entry.second.rate);
-  const double needed = durationSeconds_ * rateHz * kBytesPerSample;
-  const double installed =
-      static_cast<double>(::sysconf(_SC_PHYS_PAGES)) * static_cast<double>(::sysconf(_SC_PAGESIZE));
-  if (needed <= installed) return ssc::kOk;
-  ssc::log(ssc::kLogError, "The samples of %d seconds take %.0f MB, more memory than there is",
-           durationSeconds_, needed / 1e6);
-  return ssc::kInvalid;
 }

@@ -61,7 +61,6 @@ class ImuThermalCalibrator final : public Calibrator {
   /// Calibrate without its first and last line.
   [[nodiscard]] int measureAndStore();
   [[nodiscard]] int collect();
-  [[nodiscard]] int requireMemory() const;
   [[nodiscard]] static int reportBump(float jump);
   [[nodiscard]] int readStored(const char* sensorWord, StoredModel* stored);
   void mergeStored(const char* sensorName, const StoredModel& stored, SampleData* scale,

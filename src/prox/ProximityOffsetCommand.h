@@ -15,7 +15,11 @@ class ProximityOffsetCommand : public ProximityCommand {
   virtual bool OnProxEvent(const sns_proximity_event& reading, std::uint64_t timestamp) = 0;
 
  protected:
-  using ProximityCommand::ProximityCommand;
+  ProximityOffsetCommand(ssc::Connection* hubConnection, const char* usage, const char* options,
+                         const Source& source)
+      : ProximityCommand(hubConnection, usage, options, source) {
+    keepsSamples = false;
+  }
 
   /// Switches the automatic calibration of the offset, which also calibrates it now. A hub that refuses is
   /// only reported. 0, or why no answer came, after a level-0 message.

@@ -223,6 +223,22 @@ TEST_F(CalibratorCollect, ACollectionThatNeverBeganHasNoSamples) {
   EXPECT_EQ(captured.out, "Collecting samples...\nWARN: Unable to start the sensors. Error = -5\n");
 }
 
+TEST_F(CalibratorCollect, APeriodWhoseSamplesNoMemoryCouldHoldIsRefusedAtOnce) {
+  const Captured captured = collect(std::chrono::hours(24 * 365) * 100'000);
+  EXPECT_EQ(captured.result, ssc::kInvalid);
+  EXPECT_EQ(captured.out, "");
+  EXPECT_EQ(captured.err,
+            "ERROR: The samples of 3153600000000 seconds take 2522880000 MB, more memory than there is\n");
+  EXPECT_TRUE(script->requests.empty());
+}
+
+TEST_F(CalibratorCollect, SamplesThatAreNotKeptTakeNoMemory) {
+  script->sensors[0].reading = [](int) { return std::vector<float>{1}; };
+  calibrator->keepsSamples = false;
+  calibrator->endsAfter = [](std::size_t count) { return count >= 5; };
+  EXPECT_EQ(collect(seconds(2'147'483'647)).result, 0);
+}
+
 TEST_F(CalibratorCollect, TracesItsHandlersAtTheHighestLevel) {
   script->sensors[0].reading = [](int) { return std::vector<float>{1}; };
   ssc::setLogLevel(ssc::kLogVerbose);

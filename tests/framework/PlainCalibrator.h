@@ -39,6 +39,7 @@ class PlainCalibrator : public Calibrator {
   using Calibrator::IgnoreExtraArguments;
   using Calibrator::InvalidOption;
   using Calibrator::IsCollected;
+  using Calibrator::keepsSamples;
   using Calibrator::LookupCompanion;
   using Calibrator::LookupSuidsByName;
   using Calibrator::NotifyOrWarn;

@@ -165,7 +165,8 @@ TEST_F(ImuThermalTest, ADurationWhoseSamplesCannotBeKeptIsRefused) {
   const Captured captured = run({"imu-thermal", "2147483647"});
   EXPECT_EQ(captured.result, kInvalid);
   EXPECT_EQ(captured.err,
-            "ERROR: The samples of 2147483647 seconds take 14259291 MB, more memory than there is\n");
+            "ERROR: The samples of 2147483647 seconds take 14259291 MB, more memory than there is\n"
+            "ERROR: Unable to collect samples. Error = -22\n");
   EXPECT_EQ(captured.out, std::string("Looking up sensors...\nIMU thermal calibration begins.\n") + kFailed);
 }
 
