@@ -174,6 +174,19 @@ TEST_F(SocketServerTest, MalformedDatagramsDoNotEndTheConnection) {
   EXPECT_THAT(diagnostics, SizeIs(2));
 }
 
+TEST_F(SocketServerTest, PacketOfNoBytesIsAMalformedDatagramAndNotTheEnd) {
+  const auto server = start();
+  Client client(path);
+  client.SendRaw({});
+  client.SendRaw({});
+  client.Send(kPressure, simhub::kAttributesRequest);
+  (void)receive(*server, client, 2);
+  EXPECT_THAT(diagnostics, SizeIs(2));
+  client.SendRaw({});
+  client.Close();
+  EXPECT_TRUE(runUntil(*server, [&] { return server->ClientCount() == 0; }));
+}
+
 TEST_F(SocketServerTest, ClientThatDoesNotReadIsDisconnectedAndHoldsNobodyUp) {
   const auto server = start({"sensor.pressure.rates=[100000]"}, 1000);
   Client lazy(path);
