@@ -156,6 +156,8 @@ int serve(const Arguments& arguments, simhub::Scenario scenario) {
   const std::string root = simhub::simulatedRoot(&error);
   if (root.empty() || !simhub::prepareSimulatedRoot(root, &error)) return fail(error);
 
+  // A reader of standard error that goes away must not take the hub with it at the next line.
+  (void)::signal(SIGPIPE, SIG_IGN);
   const int stop = openStopSignals();
   if (stop < 0) return fail(std::string("signals: ") + std::strerror(errno));
   const std::string name = scenario.name;
