@@ -13,6 +13,7 @@
 #include <sys/signalfd.h>
 #include <unistd.h>
 
+#include "main/StandardStreams.h"
 #include "simhub/QrtrServer.h"
 #include "simhub/Scenario.h"
 #include "simhub/SimulatedRoot.h"
@@ -173,6 +174,7 @@ int serve(const Arguments& arguments, simhub::Scenario scenario) {
 }  // namespace
 
 int main(int argc, char** argv) {
+  openMissingStandardStreams();
   Arguments arguments;
   if (const int end = parseArguments(argc, argv, &arguments); end != 0) return end - 1;
   simhub::Scenario scenario;
