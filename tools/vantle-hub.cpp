@@ -13,6 +13,7 @@
 #include <sys/signalfd.h>
 #include <unistd.h>
 
+#include "main/StandardStreams.h"
 #include "simhub/QrtrServer.h"
 #include "simhub/Scenario.h"
 #include "simhub/SimulatedRoot.h"
@@ -156,6 +157,8 @@ int serve(const Arguments& arguments, simhub::Scenario scenario) {
   const std::string root = simhub::simulatedRoot(&error);
   if (root.empty() || !simhub::prepareSimulatedRoot(root, &error)) return fail(error);
 
+  // A reader of standard error that goes away must not take the hub with it at the next line.
+  (void)::signal(SIGPIPE, SIG_IGN);
   const int stop = openStopSignals();
   if (stop < 0) return fail(std::string("signals: ") + std::strerror(errno));
   const std::string name = scenario.name;
@@ -171,6 +174,7 @@ int serve(const Arguments& arguments, simhub::Scenario scenario) {
 }  // namespace
 
 int main(int argc, char** argv) {
+  openMissingStandardStreams();
   Arguments arguments;
   if (const int end = parseArguments(argc, argv, &arguments); end != 0) return end - 1;
   simhub::Scenario scenario;

@@ -4,10 +4,12 @@
 #include <cerrno>
 #include <cstdio>
 #include <memory>
+#include <thread>
 #include <utility>
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -16,6 +18,7 @@ namespace {
 
 constexpr mode_t kFileMode = 0644;
 constexpr mode_t kFolderMode = 0755;
+constexpr std::chrono::milliseconds kLockPause{2};
 
 /// An open file whose close is checked.
 class File {
@@ -48,7 +51,8 @@ int writeAll(int fd, const char* bytes, std::size_t size) {
 
 }  // namespace
 
-RegistryFiles::RegistryFiles(std::string folder) : folder_(std::move(folder)) {
+RegistryFiles::RegistryFiles(std::string folder, std::chrono::milliseconds lockPatience)
+    : folder_(std::move(folder)), lockPatience_(lockPatience) {
   while (folder_.size() > 1 && folder_.back() == '/') folder_.pop_back();
 }
 
@@ -59,16 +63,32 @@ int RegistryFiles::CreateFolder() {
   }
 }
 
-std::vector<std::string> RegistryFiles::List() const {
-  std::vector<std::string> names;
+int RegistryFiles::Lock(Descriptor* held) const {
+  Descriptor folder(::open(folder_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!folder.IsOpen()) return errno;
+  const auto end = std::chrono::steady_clock::now() + lockPatience_;
+  while (::flock(folder.get(), LOCK_EX | LOCK_NB) != 0) {
+    if (errno == EINTR) continue;
+    if (errno != EWOULDBLOCK) break;
+    if (std::chrono::steady_clock::now() >= end) return EWOULDBLOCK;
+    std::this_thread::sleep_for(kLockPause);
+  }
+  *held = std::move(folder);
+  return 0;
+}
+
+int RegistryFiles::List(std::vector<std::string>* names) const {
+  names->clear();
   const std::unique_ptr<DIR, int (*)(DIR*)> folder(::opendir(folder_.c_str()), ::closedir);
-  if (folder == nullptr) return names;
+  if (folder == nullptr) return errno == ENOENT || errno == ENOTDIR ? 0 : errno;
+  errno = 0;
   while (const dirent* entry = ::readdir(folder.get())) {
     const std::string name = entry->d_name;
-    if (name != "." && name != "..") names.push_back(name);
+    if (name != "." && name != "..") names->push_back(name);
   }
-  std::sort(names.begin(), names.end());
-  return names;
+  const int failure = errno;
+  std::sort(names->begin(), names->end());
+  return failure;
 }
 
 int RegistryFiles::Read(const std::string& name, std::size_t limit, std::string* content) const {

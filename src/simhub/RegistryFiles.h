@@ -2,24 +2,34 @@
 // operation is one step that a test can make fail or stop at.
 #pragma once
 
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
 
+#include "simhub/Descriptor.h"
+
 namespace simhub {
 
 class RegistryFiles {
  public:
+  /// How long another hub may keep the folder: less than a client waits for its answer.
+  static constexpr std::chrono::milliseconds kLockPatience{2000};
+
   /// `folder` with or without a closing slash.
-  explicit RegistryFiles(std::string folder);
+  explicit RegistryFiles(std::string folder, std::chrono::milliseconds lockPatience = kLockPatience);
   virtual ~RegistryFiles() = default;
 
   /// Creates the folder and those above it. 0 or an errno value, as every function here.
   [[nodiscard]] int CreateFolder();
-  /// The names of everything in the folder, sorted.
-  [[nodiscard]] std::vector<std::string> List() const;
+  /// Keeps the folder to this hub for as long as `held` is open: two hubs that wrote the same group at once
+  /// would mix their files. Waits for another hub's turn to end, for as long as the constructor says;
+  /// EWOULDBLOCK when it does not. A file system that knows no locks counts as ours.
+  [[nodiscard]] int Lock(Descriptor* held) const;
+  /// The names of everything in the folder, sorted. A folder that is not there holds nothing.
+  [[nodiscard]] int List(std::vector<std::string>* names) const;
   /// A regular file's content. EFBIG when it is larger than `limit`, EINVAL when it is no regular file.
   [[nodiscard]] int Read(const std::string& name, std::size_t limit, std::string* content) const;
 
@@ -40,6 +50,7 @@ class RegistryFiles {
 
  private:
   std::string folder_;  ///< without a closing slash
+  std::chrono::milliseconds lockPatience_;
   std::optional<std::uint64_t> freeBytes_;
 };
 

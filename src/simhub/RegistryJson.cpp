@@ -106,6 +106,15 @@ bool parseFloat(const Json& json, float* value) {
   return std::isnan(*value);
 }
 
+/// False: no integer, or one past 64 bits with a sign, which would come out as another.
+bool parseInteger(const Json& json, std::int64_t* value) {
+  if (!json.is_number_integer()) return false;
+  constexpr auto kLimit = std::uint64_t{std::numeric_limits<std::int64_t>::max()};
+  if (json.is_number_unsigned() && json.get<std::uint64_t>() > kLimit) return false;
+  *value = json.get<std::int64_t>();
+  return true;
+}
+
 /// One member of an item's object. False: unknown, or of the wrong type.
 bool parseMember(const std::string& key, const Json& value, Item* item) {
   if (key == "name" && value.is_string()) {
@@ -115,9 +124,9 @@ bool parseMember(const std::string& key, const Json& value, Item* item) {
   if (key == "name_hex" && value.is_string()) {
     return fromHex(value.get_ref<const std::string&>(), item->mutable_name());
   }
-  if (key == "version" && value.is_number_integer()) {
-    const auto version = value.get<std::int64_t>();
-    if (version != static_cast<std::int32_t>(version)) return false;
+  if (key == "version") {
+    std::int64_t version = 0;
+    if (!parseInteger(value, &version) || version != static_cast<std::int32_t>(version)) return false;
     item->set_version(static_cast<std::int32_t>(version));
     return true;
   }
@@ -132,12 +141,10 @@ bool parseMember(const std::string& key, const Json& value, Item* item) {
     item->set_flt(number);
     return true;
   }
-  if (key == "int" && value.is_number_integer()) {
-    if (value.is_number_unsigned() &&
-        value.get<std::uint64_t>() > std::uint64_t{std::numeric_limits<std::int64_t>::max()}) {
-      return false;
-    }
-    item->set_sint(value.get<std::int64_t>());
+  if (key == "int") {
+    std::int64_t number = 0;
+    if (!parseInteger(value, &number)) return false;
+    item->set_sint(number);
     return true;
   }
   if (key == "string" && value.is_string()) {

@@ -5,6 +5,7 @@
 #include <cstring>
 #include <utility>
 
+#include "simhub/Descriptor.h"
 #include "simhub/RegistryJson.h"
 #include "simhub/Suid.h"
 
@@ -19,6 +20,7 @@ constexpr std::size_t kMaxJournalBytes = std::size_t{8} << 20;
 constexpr const char* kJournal = ".journal";
 constexpr const char* kNewJournal = ".journal.new";
 constexpr const char* kJournalMark = "registry write\n";
+constexpr const char* kOtherHub = "another hub keeps it to itself";
 
 std::string newName(const std::string& name) { return "." + name + ".new"; }
 
@@ -83,18 +85,32 @@ void RegistryStore::Load(const std::vector<std::string>& torn) {
   if (const int error = files_.CreateFolder(); error != 0) {
     diagnostics_("registry folder " + files_.Path("") + ": " + describe(error));
   }
-  std::string error;
-  if (!finishJournal(&error)) diagnostics_("registry journal: " + error);
-  std::vector<std::string> leftOver;
-  for (const std::string& name : files_.List()) {
-    if (name.front() != '.') loadFile(name, torn);
-    if (name.front() == '.' && name.size() > 5 && name.ends_with(".new")) leftOver.push_back(name);
+  Descriptor turn;
+  // What another hub has under way is not to be completed or dropped here.
+  if (files_.Lock(&turn) == EWOULDBLOCK) {
+    diagnostics_("registry folder " + files_.Path("") + ": " + kOtherHub);
+  } else {
+    cleanUp();
   }
-  // Where the journal could not be finished now, its files are still needed.
-  for (const std::string& name : leftOver) {
-    if (error.empty()) (void)files_.Remove(name);
+  std::vector<std::string> names;
+  const int failure = files_.List(&names);
+  fault_ = failure != 0 ? "the folder cannot be read: " + describe(failure) : "";
+  if (!fault_.empty()) diagnostics_("registry folder " + files_.Path("") + ": " + fault_);
+  for (const std::string& name : names) {
+    if (name.front() != '.') loadFile(name, torn);
   }
   for (const auto& [group, items] : defaults_) addDefaults(group, items, 0);
+}
+
+void RegistryStore::cleanUp() {
+  std::string error;
+  if (!finishJournal(&error)) diagnostics_("registry journal: " + error);
+  std::vector<std::string> names;
+  // Where the journal could not be finished now, its files are still needed.
+  if (!error.empty() || files_.List(&names) != 0) return;
+  for (const std::string& name : names) {
+    if (name.front() == '.' && name.size() > 5 && name.ends_with(".new")) (void)files_.Remove(name);
+  }
 }
 
 void RegistryStore::addDefaults(const std::string& group, const sns_registry_data& items, int depth) {
@@ -131,6 +147,7 @@ RegistryStore::Result RegistryStore::Read(const std::string& group, sns_registry
 
 RegistryStore::Result RegistryStore::read(const std::string& group, int depth,
                                           sns_registry_data* items) const {
+  if (!fault_.empty()) return Result::kInvalid;
   const auto entry = groups_.find(group);
   if (entry == groups_.end()) return Result::kMissing;
   if (!entry->second.fault.empty() || depth > kMaxDepth) return Result::kInvalid;
@@ -188,6 +205,15 @@ bool RegistryStore::merge(const std::string& group, const sns_registry_data& ite
 }
 
 bool RegistryStore::store(const Groups& changed, std::string* error) {
+  if (!fault_.empty()) {
+    *error = fault_;
+    return false;
+  }
+  Descriptor turn;
+  if (const int busy = files_.Lock(&turn); busy != 0) {
+    *error = busy == EWOULDBLOCK ? kOtherHub : describe(busy);
+    return false;
+  }
   if (!finishJournal(error)) return false;  // an earlier write, committed but not completed
   std::map<std::string, std::string> contents;
   for (const auto& [name, group] : changed) contents[name] = formatRegistryGroup(group.items);

@@ -13,6 +13,7 @@
 //   3. the new files are renamed over the old ones (a single one: this commits), the folder is synced, the
 //   journal
 //      removed
+// Each write, and each loading, is alone with the folder: another hub on the same one waits.
 // Loading completes what a journal lists and drops new files that none lists, and a journal whose files are
 // not all there: it was not committed.
 #pragma once
@@ -59,6 +60,8 @@ class RegistryStore {
   [[nodiscard]] bool merge(const std::string& group, const sns_registry_data& items, int depth,
                            Groups* changed, std::string* error) const;
   [[nodiscard]] bool store(const Groups& changed, std::string* error);
+  /// Completes or drops what an earlier hub has left behind.
+  void cleanUp();
   /// Drops what a failed write has left.
   void undo(const std::map<std::string, std::string>& contents);
   /// Completes the write that the journal stands for, if there is one.
@@ -69,6 +72,7 @@ class RegistryStore {
   const Defaults defaults_;
   const Diagnostics diagnostics_;
   Groups groups_;
+  std::string fault_;  ///< why the folder cannot be read, and with it no group; empty: it can
 };
 
 }  // namespace simhub

@@ -1,7 +1,9 @@
 #include "simhub/RequestLog.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cinttypes>
+#include <string_view>
 
 #include "proto/sns_registry.pb.h"
 #include "proto/sns_suid.pb.h"
@@ -28,6 +30,14 @@ std::string quoted(const std::string& text) {
   return shown + "\"";
 }
 
+/// An item's name: as it is, but in quotes where it could be taken for what stands around it.
+std::string named(const std::string& name) {
+  const bool isPlain = std::all_of(name.begin(), name.end(), [](char c) {
+    return c > ' ' && c <= '~' && std::string_view("\"\\#={},").find(c) == std::string_view::npos;
+  });
+  return isPlain && !name.empty() ? name : quoted(name);
+}
+
 /// Nine digits: every float has its own text.
 std::string number(float value) {
   char text[32];
@@ -50,7 +60,7 @@ std::string formatItems(const sns_registry_data& data, int depth) {
   std::string text = "{";
   for (const sns_registry_data_item& item : data.items()) {
     if (text.size() > 1) text += ", ";
-    text += item.name();
+    text += named(item.name());
     if (item.has_version()) text += "#" + std::to_string(item.version());
     switch (item.data_case()) {
       case sns_registry_data_item::kSubgrp:

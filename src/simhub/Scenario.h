@@ -26,6 +26,9 @@ struct HubConfig {
   std::string requestLog;         ///< file that gets one line per request; empty: none
 };
 
+/// The fastest that a sensor runs, Hz, whatever is asked of it: time has to pass between two readings.
+inline constexpr double kMaxSensorRate = 1e5;
+
 /// One [sensor.KEY].
 struct SensorConfig {
   std::string key;
@@ -36,7 +39,7 @@ struct SensorConfig {
   std::string vendor = "vantle";
   std::int64_t version = 1;
   sns_std_sensor_stream_type streamType = SNS_STD_SENSOR_STREAM_TYPE_STREAMING;
-  std::vector<double> rates;  ///< Hz, ascending; the sensor runs at most at the last
+  std::vector<double> rates;  ///< Hz, ascending; the sensor runs at most at the last (none: kMaxSensorRate)
   std::vector<double> resolutions;
   std::vector<std::vector<double>> ranges;  ///< each low, high
   std::size_t selectedRange = 0;

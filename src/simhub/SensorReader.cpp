@@ -9,7 +9,6 @@ namespace simhub {
 namespace {
 
 constexpr double kMaxReading = 1e9;
-constexpr double kMaxRate = 1e5;   // Hz
 constexpr double kMinRate = 1e-3;  // Hz
 constexpr double kMaxMilliseconds = 1e6;
 constexpr std::int64_t kMaxBatch = 1000;
@@ -102,7 +101,7 @@ void readTiming(TableReader& reader, SensorConfig* config) {
   if (reader.Number("settling_ms", 0, kMaxMilliseconds, &milliseconds)) {
     config->settling = fromSeconds(milliseconds * 1e-3);
   }
-  if (reader.Numbers("rates", 1, kMaxListed, kMinRate, kMaxRate, &config->rates) &&
+  if (reader.Numbers("rates", 1, kMaxListed, kMinRate, kMaxSensorRate, &config->rates) &&
       !std::is_sorted(config->rates.begin(), config->rates.end())) {
     reader.Problem("rates", "have to ascend");
   }

@@ -33,6 +33,12 @@ bool makeAddress(const std::string& path, sockaddr_un* address, std::string* err
 
 const sockaddr* generic(const sockaddr_un& address) { return reinterpret_cast<const sockaddr*>(&address); }
 
+/// Whether the client has ended the connection; packets of before may still be there.
+bool hungUp(const Descriptor& socket) {
+  pollfd polled{socket.get(), POLLRDHUP, 0};
+  return ::poll(&polled, 1, 0) > 0;
+}
+
 int openSocket() { return ::socket(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC | SOCK_NONBLOCK, 0); }
 
 }  // namespace
@@ -120,7 +126,8 @@ void SocketServer::receive(ClientId client, Connection& connection) {
     const ssize_t size = ::recv(connection.socket.get(), buffer_.data(), buffer_.size(), MSG_TRUNC);
     if (size < 0 && errno == EINTR) continue;
     if (size < 0 && (errno == EAGAIN || errno == EWOULDBLOCK)) return;
-    if (size <= 0) {
+    // A packet of no bytes, which is a malformed datagram, looks like the end but for the client being there.
+    if (size < 0 || (size == 0 && hungUp(connection.socket))) {
       connection.isLost = true;
       return;
     }

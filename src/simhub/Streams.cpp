@@ -15,7 +15,8 @@ constexpr double kDefaultRate = 10;
 Time periodOf(double rate) { return Time{std::llround(1e9 / rate)}; }
 
 double allowedRate(const SensorConfig& config, double asked) {
-  const double highest = config.rates.empty() ? std::max(asked, kDefaultRate) : config.rates.back();
+  const double highest =
+      config.rates.empty() ? std::clamp(asked, kDefaultRate, kMaxSensorRate) : config.rates.back();
   return std::max(kMinRate, asked > 0 ? std::min(asked, highest) : highest);
 }
 

@@ -10,6 +10,9 @@ namespace {
 
 constexpr std::size_t kMaxProblems = 20;
 constexpr const char* kOverride = "override ";
+/// Each part of a dotted key is one table in another, and a tree of tables is walked and taken down by
+/// recursion. The registry's deepest subgroup needs half of this.
+constexpr int kMaxKeyParts = 40;
 
 /// "FILE:LINE", or just what it is called where there are no lines.
 std::string place(const toml::node* node, const std::string& fallback) {
@@ -24,6 +27,59 @@ bool isBareKey(std::string_view key) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' || c == '-';
   });
 }
+
+/// Finds keys of too many parts in a text before a parser builds tables of them.
+class KeyScanner {
+ public:
+  explicit KeyScanner(std::string_view text) : text_(text) {}
+
+  /// The line of the first key that has more than kMaxKeyParts parts; 0: there is none.
+  [[nodiscard]] std::size_t FindOverlong() {
+    int parts = 1;
+    while (at_ < text_.size()) {
+      const char c = text_[at_];
+      if (c == '"' || c == '\'') {
+        skipString(c);
+      } else if (c == '#') {
+        at_ = std::min(text_.find('\n', at_), text_.size());
+      } else {
+        if (c == '.' && ++parts > kMaxKeyParts) return line();
+        if (endsKey(c)) parts = 1;
+        ++at_;
+      }
+    }
+    return 0;
+  }
+
+ private:
+  void skipString(char quote) {
+    const std::string ofLines(3, quote);
+    const bool hasLines = text_.substr(at_, ofLines.size()) == ofLines;
+    const std::string_view end = hasLines ? std::string_view(ofLines) : std::string_view(ofLines).substr(2);
+    at_ += end.size();
+    while (at_ < text_.size() && text_.substr(at_, end.size()) != end) {
+      if (!hasLines && text_[at_] == '\n') return;  // left open, which the parser reports
+      at_ += quote == '"' && text_[at_] == '\\' ? 2 : 1;
+    }
+    at_ += end.size();
+    // A string of lines may itself end in one or two of its quotes.
+    for (int i = 0; hasLines && i < 2 && at_ < text_.size() && text_[at_] == quote; ++i) ++at_;
+  }
+  /// Everything but what a key's parts, and the blanks around its dots, are made of.
+  static bool endsKey(char c) {
+    const bool isAscii = static_cast<unsigned char>(c) < 0x80;
+    return isAscii && c != '.' && c != ' ' && c != '\t' && !isBareKey({&c, 1});
+  }
+  [[nodiscard]] std::size_t line() const {
+    const auto here = text_.begin() + static_cast<std::ptrdiff_t>(at_);
+    return 1 + static_cast<std::size_t>(std::count(text_.begin(), here, '\n'));
+  }
+
+  const std::string_view text_;
+  std::size_t at_ = 0;
+};
+
+std::string tooManyParts() { return "a key of more than " + std::to_string(kMaxKeyParts) + " parts"; }
 
 std::string quoted(std::string_view text) {
   std::string out = "\"";
@@ -216,6 +272,10 @@ void mergeTables(toml::table& into, toml::table&& from) {
 }
 
 bool parseToml(std::string_view text, const std::string& source, toml::table* table, Problems* problems) {
+  if (const std::size_t line = KeyScanner(text).FindOverlong(); line != 0) {
+    problems->AddText(source + ":" + std::to_string(line) + ": " + tooManyParts());
+    return false;
+  }
   toml::parse_result result = toml::parse(text, source);
   if (!result) {
     const toml::parse_error& error = result.error();
@@ -235,9 +295,14 @@ bool parseOverride(const std::string& text, toml::table* table, Problems* proble
     problems->AddText(source + ": has to be KEY=VALUE");
     return false;
   }
+  if (KeyScanner(key).FindOverlong() != 0) {
+    problems->AddText(source + ": " + tooManyParts());
+    return false;
+  }
   const std::string value = text.substr(equals + 1);
   // What is no TOML value by itself is text that nobody wanted to quote.
-  const bool isValue = static_cast<bool>(toml::parse("value = " + value));
+  const bool isValue =
+      KeyScanner(value).FindOverlong() == 0 && static_cast<bool>(toml::parse("value = " + value));
   toml::parse_result result = toml::parse(key + " = " + (isValue ? value : quoted(value)), source);
   if (!result) {
     problems->AddText(source + ": " + std::string(result.error().description()));

@@ -416,4 +416,29 @@ TEST_F(SocketHub, AHubThatStopsAnsweringEndsTheRunToo) {
   EXPECT_TRUE(hub->signal(SIGCONT));
 }
 
+TEST_F(SocketHub, WhatAHubWithoutStandardStreamsSaysGoesToNoClient) {
+  support::Command start{"/bin/sh", "", {}, environment(), "", ""};
+  start.arguments = {"-c",
+                     R"(exec "$0" "$@" <&- >&- 2>&-)",
+                     VANTLE_HUB_PROGRAM,
+                     "--socket",
+                     socket().string(),
+                     "--speed",
+                     "20",
+                     "--set",
+                     "fault.f.kind=full_disk"};
+  support::Process hub;
+  ASSERT_TRUE(hub.start(start));
+  const auto deadline = std::chrono::steady_clock::now() + kPatience;
+  // Nothing tells when it listens.
+  support::Outcome outcome;
+  do {
+    outcome = support::run(vantle({"-q", "baro", "1013.25"}), kPatience);
+  } while (outcome.exitedWith(-19) && std::chrono::steady_clock::now() < deadline);
+  // The hub says that it cannot write, but not through the socket that would have its standard error's
+  // number.
+  EXPECT_TRUE(outcome.exitedWith(-5)) << outcome.describe() << outcome.errors;
+  EXPECT_EQ(outcome.output.find("malformed"), std::string::npos) << outcome.output;
+}
+
 }  // namespace

@@ -218,6 +218,15 @@ TEST(Hub, HighestSupportedRateIsTheLimit) {
   EXPECT_THAT(hub.Readings(suid), SizeIs(100));
 }
 
+TEST(Hub, TimePassesAtAnyRateThatASensorWithoutRatesIsAskedFor) {
+  HubHarness hub({"sensor.bare.model=barometer", "sensor.bare.name=bare"});
+  hub.Configure(simhub::suidForName("bare"), 3e38F);
+  const Time start = hub.hub->Now();
+  constexpr int kSteps = 1000;
+  for (int i = 0; i < kSteps; ++i) hub.hub->Step();
+  EXPECT_GT(hub.hub->Now() - start, simhub::fromSeconds(0.9 * kSteps / simhub::kMaxSensorRate));
+}
+
 TEST(Hub, EachClientGetsItsOwnRateOfOneSensor) {
   HubHarness hub;
   const Suid suid = hub.Find("pressure");

@@ -125,6 +125,10 @@ TEST(RegistryJson, ItemsThatMakeNoSenseAreRefused) {
   EXPECT_THAT(errorOf(item("\"name\": \"a\", \"int\": 1.5")), HasSubstr("int"));
   EXPECT_THAT(errorOf(item("\"name\": \"a\", \"int\": 9223372036854775808")), HasSubstr("int"));
   EXPECT_THAT(errorOf(item("\"name\": \"a\", \"version\": 2147483648")), HasSubstr("version"));
+  EXPECT_THAT(errorOf(item("\"name\": \"a\", \"version\": -2147483649")), HasSubstr("version"));
+  EXPECT_THAT(errorOf(item("\"name\": \"a\", \"version\": 18446744073709551615")), HasSubstr("version"));
+  EXPECT_THAT(errorOf(item("\"name\": \"a\", \"version\": 18446744071562067968")), HasSubstr("version"));
+  EXPECT_THAT(errorOf(item("\"name\": \"a\", \"version\": 1.0")), HasSubstr("version"));
   EXPECT_THAT(errorOf(item("\"name\": \"a\", \"string_hex\": \"0g\"")), HasSubstr("string_hex"));
   EXPECT_THAT(errorOf("{\"items\": [{\"name\": \"a\"}, {\"name\": \"a\"}]}"), HasSubstr("twice"));
 }

@@ -1,14 +1,17 @@
 #include "simhub/RegistryStore.h"
 
 #include <cerrno>
+#include <chrono>
 #include <filesystem>
 #include <memory>
+#include <thread>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "simhub/HubHarness.h"
 #include "simhub/RegistryJson.h"
+#include "support/DescriptorLimit.h"
 
 namespace {
 
@@ -60,6 +63,12 @@ class FailingFiles final : public simhub::RegistryFiles {
   }
   Way way_ = Way::kFails;
 };
+
+std::vector<std::string> namesIn(const simhub::RegistryFiles& files) {
+  std::vector<std::string> names;
+  EXPECT_EQ(files.List(&names), 0);
+  return names;
+}
 
 class RegistryStoreTest : public testing::Test {
  protected:
@@ -211,7 +220,7 @@ TEST_F(RegistryStoreTest, NamesThatCannotBeFilesAreRefused) {
     addFloat(addGroup(&nested, name)->mutable_subgrp(), "x", 1);
     EXPECT_FALSE(store->Write("group", nested)) << name;
   }
-  EXPECT_THAT(files.List(), IsEmpty());
+  EXPECT_THAT(namesIn(files), IsEmpty());
 }
 
 TEST_F(RegistryStoreTest, TooDeepNestingIsRefused) {
@@ -219,7 +228,7 @@ TEST_F(RegistryStoreTest, TooDeepNestingIsRefused) {
   sns_registry_data* level = &items;
   for (int i = 0; i < 40; ++i) level = addGroup(level, "s")->mutable_subgrp();
   EXPECT_FALSE(open()->Write("g", items));
-  EXPECT_THAT(files.List(), IsEmpty());
+  EXPECT_THAT(namesIn(files), IsEmpty());
 }
 
 TEST_F(RegistryStoreTest, FullDiskIsReportedAndChangesNothing) {
@@ -228,7 +237,7 @@ TEST_F(RegistryStoreTest, FullDiskIsReportedAndChangesNothing) {
   EXPECT_FALSE(store->Write(kGroup, calibration(1, 2)));
   EXPECT_THAT(diagnostics, ElementsAre(HasSubstr("No space left")));
   EXPECT_EQ(read(*store), "bias={x=0}, mean_temp=0");
-  EXPECT_THAT(files.List(), IsEmpty());
+  EXPECT_THAT(namesIn(files), IsEmpty());
   files.LimitFreeBytes(std::nullopt);
   EXPECT_TRUE(store->Write(kGroup, calibration(1, 2)));
 }
@@ -253,7 +262,7 @@ TEST_F(RegistryStoreTest, CrashAtEveryStepLeavesAllOrNothing) {
       EXPECT_EQ(found, after) << "step " << step;
     }
     completed += found == after ? 1 : 0;
-    EXPECT_THAT(files.List(), ElementsAre(kGroup, kSubgroup)) << "step " << step;
+    EXPECT_THAT(namesIn(files), ElementsAre(kGroup, kSubgroup)) << "step " << step;
     if (!crashed) break;
   }
   EXPECT_GT(step, 8);       // two files, the journal, three renames, two syncs, a removal
@@ -281,13 +290,13 @@ TEST_F(RegistryStoreTest, WriteAfterAnUncompletedOneCompletesItFirst) {
   files.FailAt(7, FailingFiles::Way::kFails);  // a rename after the commit
   ASSERT_TRUE(store->Write(kGroup, calibration(1, 10)));
   files.failAt = -1;
-  ASSERT_THAT(files.List(), testing::Contains(".journal"));
+  ASSERT_THAT(namesIn(files), testing::Contains(".journal"));
   sns_registry_data items;
   addFloat(&items, "mean_temp", 30);
   ASSERT_TRUE(store->Write(kGroup, items));
   EXPECT_EQ(read(*store), "bias#1={x#1=1}, mean_temp=30");
   EXPECT_EQ(read(*open()), "bias#1={x#1=1}, mean_temp=30");
-  EXPECT_THAT(files.List(), ElementsAre(kGroup, kSubgroup));
+  EXPECT_THAT(namesIn(files), ElementsAre(kGroup, kSubgroup));
 }
 
 TEST_F(RegistryStoreTest, JournalCutAnywhereIsDroppedWhole) {
@@ -307,8 +316,67 @@ TEST_F(RegistryStoreTest, JournalCutAnywhereIsDroppedWhole) {
     RegistryStore reopened(cut, defaults, [](const std::string&) {});
     reopened.Load();
     EXPECT_EQ(read(reopened), "bias#1={x#1=1}, mean_temp#1=10") << size;
-    EXPECT_THAT(cut.List(), ElementsAre(kGroup, kSubgroup)) << size;
+    EXPECT_THAT(namesIn(cut), ElementsAre(kGroup, kSubgroup)) << size;
   }
+}
+
+// ---- Two hubs on one folder ----
+
+TEST_F(RegistryStoreTest, WriteDuringAnotherHubsTurnWaitsForItsEnd) {
+  const auto store = open();
+  auto turn = std::make_unique<simhub::Descriptor>();
+  ASSERT_EQ(simhub::RegistryFiles(folder.Path("registry")).Lock(turn.get()), 0);
+  bool reported = false;
+  std::thread writer([&] { reported = store->Write(kGroup, calibration(1, 10)); });
+  turn.reset();
+  writer.join();
+  EXPECT_TRUE(reported);
+  EXPECT_EQ(read(*open()), "bias#1={x#1=1}, mean_temp#1=10");
+}
+
+TEST_F(RegistryStoreTest, TurnThatDoesNotEndMakesAWriteFailAndChangesNothing) {
+  simhub::RegistryFiles impatient(folder.Path("registry"), std::chrono::milliseconds(0));
+  RegistryStore store(impatient, defaults, [this](const std::string& text) { diagnostics.push_back(text); });
+  store.Load();
+  {
+    simhub::Descriptor turn;
+    ASSERT_EQ(files.Lock(&turn), 0);
+    EXPECT_FALSE(store.Write(kGroup, calibration(1, 10)));
+    EXPECT_THAT(diagnostics, ElementsAre(HasSubstr("another hub")));
+    EXPECT_EQ(read(store), "bias={x=0}, mean_temp=0");
+    EXPECT_THAT(namesIn(files), IsEmpty());
+  }
+  EXPECT_TRUE(store.Write(kGroup, calibration(1, 10)));
+}
+
+TEST_F(RegistryStoreTest, LoadingLeavesWhatAnotherHubHasUnderWay) {
+  simhub::RegistryFiles impatient(folder.Path("registry"), std::chrono::milliseconds(0));
+  folder.WriteFile("registry/.group.new", "half of");
+  folder.WriteFile("registry/.journal", "half of");
+  RegistryStore store(impatient, defaults, [this](const std::string& text) { diagnostics.push_back(text); });
+  {
+    simhub::Descriptor turn;
+    ASSERT_EQ(files.Lock(&turn), 0);
+    store.Load();
+    EXPECT_THAT(diagnostics, ElementsAre(HasSubstr("another hub")));
+    EXPECT_EQ(read(store), "bias={x=0}, mean_temp=0");
+    EXPECT_THAT(namesIn(files), ElementsAre(".group.new", ".journal"));
+  }
+  store.Load();
+  EXPECT_THAT(namesIn(files), IsEmpty());
+}
+
+TEST_F(RegistryStoreTest, FolderThatCannotBeListedIsNoRegistryOfDefaults) {
+  ASSERT_TRUE(open()->Write(kGroup, calibration(2.75F, 27.5F)));
+  std::unique_ptr<RegistryStore> store;
+  {
+    const support::DescriptorLimit none(0);
+    store = open();
+  }
+  EXPECT_THAT(diagnostics, testing::Contains(HasSubstr("the folder cannot be read: Too many open files")));
+  EXPECT_EQ(read(*store), "invalid");
+  EXPECT_FALSE(store->Write(kGroup, calibration(1, 1)));
+  EXPECT_EQ(read(*open()), "bias#1={x#1=2.75}, mean_temp#1=27.5");
 }
 
 }  // namespace

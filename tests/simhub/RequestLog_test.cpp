@@ -60,6 +60,23 @@ TEST(RequestLog, ShowsRegistryItemsWithVersionsAndKinds) {
             "0.001500 registry 512 name=\"barochip_0_platform.pressure.fac_cal\"\n");
 }
 
+TEST(RequestLog, NamesOfItemsMakeNoLinesOfTheirOwn) {
+  TemporaryFolder folder;
+  HubHarness hub({"hub.request_log=" + folder.Path("log")});
+  const simhub::Suid registry = hub.Find("registry");
+  sns_registry_write_req request;
+  request.set_name("g\nh");
+  for (const std::string& name : {std::string("a.b-c_0"), std::string("x\n9.9 suid 1"), std::string("a=1, b"),
+                                  std::string("a\0b", 3), std::string()}) {
+    addFloat(request.mutable_data(), name, 1);
+  }
+  (void)hub.Ask(registry, simhub::kRegistryWriteRequest, request.SerializeAsString());
+  EXPECT_EQ(folder.ReadFile("log"),
+            "0.000000 suid 512 data_type=\"registry\"\n"
+            "0.000500 registry 513 name=\"g\\x0ah\" {a.b-c_0=1, \"x\\x0a9.9 suid 1\"=1, \"a=1, b\"=1, "
+            "\"a\\x00b\"=1, \"\"=1}\n");
+}
+
 TEST(RequestLog, FileThatCannotBeOpenedIsAnError) {
   HubHarness fine;
   fine.scenario.hub.requestLog = "/nonexistent/log";

@@ -333,6 +333,49 @@ TEST(Scenario, MistakesInOverridesNameTheOverride) {
   EXPECT_THAT(errorOf("", {"hub=3"}), HasSubstr("hub: has to be a table"));
 }
 
+/// "a.a. … .a" of that many parts.
+std::string keyOf(std::size_t parts) {
+  std::string key = "a";
+  for (std::size_t i = 1; i < parts; ++i) key += ".a";
+  return key;
+}
+
+constexpr const char* kTooManyParts = ": a key of more than 40 parts";
+
+TEST(Scenario, KeyOfTooManyPartsIsRefusedBeforeItBecomesATreeThatIsTooDeep) {
+  const std::string deep = keyOf(1'000'000);
+  EXPECT_EQ(errorOf("\n" + deep + " = 1\n"), std::string("test.toml:2") + kTooManyParts);
+  EXPECT_EQ(errorOf("[" + deep + "]\n"), std::string("test.toml:1") + kTooManyParts);
+  EXPECT_EQ(errorOf("[[" + deep + "]]\n"), std::string("test.toml:1") + kTooManyParts);
+  EXPECT_EQ(errorOf("[registry." + deep + "]\n"), std::string("test.toml:1") + kTooManyParts);
+  EXPECT_EQ(errorOf("a = \"b.c\" # ...\nd = { " + deep + " = 1 }\n"),
+            std::string("test.toml:2") + kTooManyParts);
+  EXPECT_EQ(errorOf("", {keyOf(41) + "=1"}), "override \"" + keyOf(41) + "=1\"" + kTooManyParts);
+  EXPECT_THAT(errorOf(keyOf(41) + " = 1"), HasSubstr(kTooManyParts));
+  EXPECT_THAT(errorOf(keyOf(40) + " = 1"), HasSubstr("a: unknown key"));
+}
+
+TEST(Scenario, KeyOfTooManyPartsHidesBehindNoStringAndNoBlank) {
+  const std::string deep = keyOf(1'000'000);
+  for (const char* const before :
+       {R"("x")", R"('x\')", R"("x\"")", "\"\"\"x\n\"\"\"\"\"", "'''x\n''''", R"("")", "''"}) {
+    EXPECT_THAT(errorOf(std::string("v = { s = ") + before + ", " + deep + " = 1 }"),
+                HasSubstr(kTooManyParts))
+        << before;
+  }
+  std::string spaced = "a";
+  for (int i = 0; i < 1'000'000; ++i) spaced += " .\t'a'";
+  EXPECT_THAT(errorOf(spaced + " = 1"), HasSubstr(kTooManyParts));
+}
+
+TEST(Scenario, DotsThatAreInNoKeyAreNotCounted) {
+  const std::string dots = std::string(100, '.') + keyOf(50);
+  const Scenario scenario =
+      parse("# " + dots + "\n" + kBarometer + "vendor = \"" + dots + "\"\nnoise = [0.1, 0.2, 0.3, 0.4]\n");
+  EXPECT_EQ(sensor(scenario, "pressure").vendor, dots);
+  EXPECT_EQ(sensor(parse(kBarometer, {"sensor.pressure.vendor=" + dots}), "pressure").vendor, dots);
+}
+
 // ---- Sensors' names ----
 
 TEST(PackageName, IsCutAtTheFirstBlankElseAtTheFirstUnderscore) {

@@ -17,6 +17,7 @@
 #include "simhub/Protocol.h"
 #include "simhub/Suid.h"
 #include "simhub/TemporaryFolder.h"
+#include "support/DescriptorLimit.h"
 
 namespace {
 
@@ -172,6 +173,55 @@ TEST_F(SocketServerTest, MalformedDatagramsDoNotEndTheConnection) {
   client.Send(kPressure, simhub::kAttributesRequest);
   (void)receive(*server, client, 2);
   EXPECT_THAT(diagnostics, SizeIs(2));
+}
+
+TEST_F(SocketServerTest, PacketOfNoBytesIsAMalformedDatagramAndNotTheEnd) {
+  const auto server = start();
+  Client client(path);
+  client.SendRaw({});
+  client.SendRaw({});
+  client.Send(kPressure, simhub::kAttributesRequest);
+  (void)receive(*server, client, 2);
+  EXPECT_THAT(diagnostics, SizeIs(2));
+  client.SendRaw({});
+  client.Close();
+  EXPECT_TRUE(runUntil(*server, [&] { return server->ClientCount() == 0; }));
+}
+
+TEST_F(SocketServerTest, ClientsBeyondTheMostThatThereCanBeAreTurnedAway) {
+  const auto server = start();
+  std::vector<std::unique_ptr<Client>> clients;
+  for (std::size_t count = 1; count <= SocketServer::kMaxClients; ++count) {
+    clients.push_back(std::make_unique<Client>(path));
+    ASSERT_TRUE(runUntil(*server, [&] { return server->ClientCount() == count; }));
+  }
+  EXPECT_THAT(diagnostics, SizeIs(0));
+  const Client tooMany(path);
+  EXPECT_TRUE(ends(*server, tooMany));
+  EXPECT_THAT(diagnostics, ElementsAre("more than 256 clients: one is turned away"));
+  EXPECT_EQ(server->ClientCount(), SocketServer::kMaxClients);
+  clients.back()->Close();
+  ASSERT_TRUE(runUntil(*server, [&] { return server->ClientCount() < SocketServer::kMaxClients; }));
+  Client next(path);
+  next.Send(kPressure, simhub::kAttributesRequest);
+  EXPECT_THAT(receive(*server, next, 2), SizeIs(2));
+}
+
+TEST_F(SocketServerTest, ClientThatComesWhileNoDescriptorIsLeftIsTakenLater) {
+  const auto server = start();
+  Client first(path);
+  ASSERT_TRUE(runUntil(*server, [&] { return server->ClientCount() == 1; }));
+  Client second(path);
+  {
+    const support::DescriptorLimit none(0);
+    ASSERT_TRUE(runUntil(*server, [&] { return !diagnostics.empty(); }));
+    EXPECT_THAT(diagnostics, ElementsAre("a client has to wait: Too many open files"));
+    first.Send(kPressure, simhub::kAttributesRequest);
+    EXPECT_THAT(receive(*server, first, 2), SizeIs(2)) << "who is there is served meanwhile";
+    EXPECT_EQ(server->ClientCount(), 1U);
+  }
+  second.Send(kPressure, simhub::kAttributesRequest);
+  EXPECT_THAT(receive(*server, second, 2), SizeIs(2));
 }
 
 TEST_F(SocketServerTest, ClientThatDoesNotReadIsDisconnectedAndHoldsNobodyUp) {

@@ -157,7 +157,9 @@ TEST_P(ConnectionThreads, UnregisteringWaitsForTheHandlerThatRuns) {
         entered = true;
         condition.notify_all();
       }
-      for (int i = 0; i < 1000; ++i) std::this_thread::yield();
+      // Time for the other thread to come here too soon; on a busy machine each turn is long by itself.
+      const auto end = std::chrono::steady_clock::now() + std::chrono::milliseconds(2);
+      for (int i = 0; i < 1000 && std::chrono::steady_clock::now() < end; ++i) std::this_thread::yield();
       left = true;
     }
     void run() {

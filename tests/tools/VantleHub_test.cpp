@@ -14,6 +14,7 @@
 #include <poll.h>
 #include <spawn.h>
 #include <sys/socket.h>
+#include <sys/un.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -57,9 +58,16 @@ class Process {
       ::kill(pid_, SIGKILL);
       ::waitpid(pid_, nullptr, 0);
     }
-    for (const int stream : streams_) ::close(stream);
+    for (const int stream : streams_) {
+      if (stream >= 0) ::close(stream);
+    }
   }
 
+  /// Whoever reads what it says goes away.
+  void CloseStreams() {
+    for (int& stream : streams_) ::close(std::exchange(stream, -1));
+    ended_.fill(true);
+  }
   void Signal(int number) const { EXPECT_EQ(::kill(pid_, number), 0); }
 
   /// Reads until standard error holds `text`.
@@ -105,6 +113,34 @@ class Process {
   std::array<bool, 2> ended_{};
 };
 
+/// A client's end of the hub's socket.
+class Client {
+ public:
+  explicit Client(const std::string& path) : fd_(::socket(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC, 0)) {
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    path.copy(address.sun_path, sizeof address.sun_path - 1);
+    EXPECT_EQ(::connect(fd_, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
+  }
+  Client(const Client&) = delete;
+  Client& operator=(const Client&) = delete;
+  ~Client() { ::close(fd_); }
+
+  [[nodiscard]] bool Send(const std::vector<std::uint8_t>& packet) const {
+    return ::send(fd_, packet.data(), packet.size(), MSG_NOSIGNAL) == static_cast<ssize_t>(packet.size());
+  }
+  /// Whether a packet comes rather than the end.
+  [[nodiscard]] bool Answered() const {
+    pollfd polled{fd_, POLLIN, 0};
+    (void)::poll(&polled, 1, static_cast<int>(std::chrono::milliseconds(kPatience).count()));
+    std::array<char, 4096> buffer{};
+    return ::recv(fd_, buffer.data(), buffer.size(), MSG_DONTWAIT) > 0;
+  }
+
+ private:
+  int fd_;
+};
+
 class VantleHub : public testing::Test {
  protected:
   VantleHub() {
@@ -121,6 +157,21 @@ class VantleHub : public testing::Test {
   std::filesystem::path folder;
   std::string socket;
 };
+
+TEST_F(VantleHub, OutlivesWhoeverReadsItsStandardError) {
+  Process hub({"--socket", socket});
+  ASSERT_TRUE(hub.SaysOnError("listening on"));
+  hub.CloseStreams();
+  // A line of the hub's for each; the answer shows that it has come past them.
+  const Client client(socket);
+  EXPECT_TRUE(client.Send({1, 2, 3}));
+  EXPECT_TRUE(client.Send({1, 2, 3}));
+  // A whole datagram, but what it carries is no request.
+  EXPECT_TRUE(client.Send({0, 1, 0, 0x20, 0, 6, 0, 0x01, 3, 0, 1, 0, 0xff}));
+  EXPECT_TRUE(client.Answered());
+  hub.Signal(SIGTERM);
+  EXPECT_EQ(hub.Wait(), 0);
+}
 
 TEST_F(VantleHub, HelpGoesToStandardOutput) {
   Process hub({"--help"});

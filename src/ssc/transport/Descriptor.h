@@ -41,6 +41,9 @@ class Interrupter {
  public:
   Interrupter();
 
+  /// False: there was no descriptor left for it, with the reason in errno. Nothing would end a wait.
+  [[nodiscard]] bool works() const { return event_.valid(); }
+
   void Signal();
 
   enum class Woken { kReady, kDeadline, kInterrupted };

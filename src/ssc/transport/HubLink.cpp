@@ -1,4 +1,6 @@
+#include <cerrno>
 #include <cstdlib>
+#include <cstring>
 #include <string_view>
 
 #include "ssc/Log.h"
@@ -26,7 +28,8 @@ int openUnixLink(const std::string& path, HubLink* link) {
     log(kLogError, "The socket path in VANTLE_HUB is empty or too long: \"%s\". %s", path.c_str(),
         kHowToChoose);
   } else if (result != kOk) {
-    log(kLogError, "No sensor hub listens on the socket \"%s\". %s", path.c_str(), kHowToChoose);
+    log(kLogError, "No sensor hub can be reached on the socket \"%s\" (%s). %s", path.c_str(),
+        std::strerror(errno), kHowToChoose);
   } else {
     link->clock = std::make_unique<RealClock>();
   }

@@ -27,6 +27,9 @@ class KernelSocket final : public QrtrSocket {
  public:
   KernelSocket(Descriptor socket, std::uint32_t node) : socket_(std::move(socket)), node_(node) {}
 
+  /// False: there is no descriptor left, with the reason in errno.
+  [[nodiscard]] bool works() const { return interrupt_.works(); }
+
   [[nodiscard]] std::uint32_t LocalNode() const override { return node_; }
 
   [[nodiscard]] int Send(const QrtrAddress& to, qmi::Bytes packet) override {
@@ -115,7 +118,9 @@ std::unique_ptr<QrtrSocket> QrtrSocket::Open() {
   sockaddr_qrtr address{};
   socklen_t length = sizeof address;
   if (::getsockname(socket.get(), reinterpret_cast<sockaddr*>(&address), &length) != 0) return nullptr;
-  return std::make_unique<KernelSocket>(std::move(socket), address.sq_node);
+  auto made = std::make_unique<KernelSocket>(std::move(socket), address.sq_node);
+  if (!made->works()) return nullptr;
+  return made;
 }
 
 }  // namespace ssc

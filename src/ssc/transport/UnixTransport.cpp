@@ -29,7 +29,9 @@ int UnixTransport::Connect(const std::string& path, std::unique_ptr<Transport>* 
   if (!fillAddress(path, &address)) return kInvalid;
   Descriptor socket = connectTo(path);
   if (!socket.valid()) return kNoHub;
-  transport->reset(new UnixTransport(path, std::move(socket)));
+  std::unique_ptr<UnixTransport> made(new UnixTransport(path, std::move(socket)));
+  if (!made->interrupt_.works()) return kNoHub;
+  *transport = std::move(made);
   return kOk;
 }
 

@@ -16,8 +16,8 @@ namespace ssc {
 
 class UnixTransport final : public Transport {
  public:
-  /// Connects to the hub that listens at `path`. 0; kNoHub when nothing does; kInvalid when the path does not
-  /// fit a socket address. `transport` is set on success only.
+  /// Connects to the hub that listens at `path`. 0; kNoHub when it cannot be reached, with the reason in
+  /// errno; kInvalid when the path does not fit a socket address. `transport` is set on success only.
   [[nodiscard]] static int Connect(const std::string& path, std::unique_ptr<Transport>* transport);
 
   /// How often a hub that went away is looked for.

@@ -1,6 +1,7 @@
 // The transport over a real socket. Waits have deadlines far beyond what they take.
 #include "ssc/transport/UnixTransport.h"
 
+#include <cerrno>
 #include <chrono>
 #include <memory>
 #include <string>
@@ -13,6 +14,7 @@
 #include "ssc/HubServer.h"
 #include "ssc/Results.h"
 #include "ssc/TestClient.h"
+#include "support/DescriptorLimit.h"
 
 namespace {
 
@@ -107,6 +109,17 @@ TEST_F(UnixTransportTest, PacketOfNoBytesIsADatagramAndNotTheEnd) {
   for (int i = 0; i < 40; ++i) ASSERT_TRUE(server_.Send({}));
   for (int i = 0; i < 40; ++i) expectDatagram({});
   EXPECT_EQ(transport_->Receive(clock_.now(), &incoming_), Outcome::kDeadline);
+}
+
+TEST_F(UnixTransportTest, ConnectingNeedsADescriptorForTheEndOfAWaitToo) {
+  // Without it a connection could be opened, but never closed.
+  std::unique_ptr<Transport> transport;
+  for (const rlim_t left : {0U, 1U}) {
+    const support::DescriptorLimit limit(left);
+    EXPECT_EQ(ssc::UnixTransport::Connect(server_.path(), &transport), ssc::kNoHub) << left;
+    EXPECT_EQ(errno, EMFILE) << left;
+    EXPECT_EQ(transport, nullptr) << left;
+  }
 }
 
 TEST_F(UnixTransportTest, DeadlinePassesWithoutAnythingComingIn) {
