@@ -21,13 +21,10 @@ constexpr double kBytesPerSample = 80;
 
 /// Whether the sensor's stream type is `streamType` and, if so, the package that its name stands for. Results
 /// as of the library.
-int readPackage(ssc::AttrUtil& attributeUtil, const ssc::SensorUid& suid,
-                sns_std_sensor_stream_type streamType, bool* isOfType, std::string* package) {
-  sns_std_attr_event attributes;
-  int result = attributeUtil.LoadAttributes(suid, &attributes);
-  if (result != ssc::kOk) return result;
+int packageOf(const sns_std_attr_event& attributes, sns_std_sensor_stream_type streamType, bool* isOfType,
+              std::string* package) {
   sns_std_sensor_stream_type type{};
-  result = ssc::AttrUtil::GetStreamType(attributes, &type);
+  int result = ssc::AttrUtil::GetStreamType(attributes, &type);
   if (result != ssc::kOk) return result;
   *isOfType = type == streamType;
   if (!*isOfType) return ssc::kOk;
@@ -36,13 +33,23 @@ int readPackage(ssc::AttrUtil& attributeUtil, const ssc::SensorUid& suid,
   return result;
 }
 
-/// The first of the sensors that is of the package and the stream type, or null.
-const ssc::SensorUid* findInPackage(ssc::AttrUtil& attributeUtil, const std::vector<ssc::SensorUid>& suids,
-                                    const std::string& package, sns_std_sensor_stream_type streamType) {
+int readPackage(ssc::AttrUtil& attributeUtil, const ssc::SensorUid& suid,
+                sns_std_sensor_stream_type streamType, bool* isOfType, std::string* package) {
+  sns_std_attr_event attributes;
+  const int result = attributeUtil.LoadAttributes(suid, &attributes);
+  return result == ssc::kOk ? packageOf(attributes, streamType, isOfType, package) : result;
+}
+
+/// The first of the sensors of `dataType` that is of the package and the stream type, or null.
+const ssc::SensorUid* findInPackage(ssc::AttrUtil& attributeUtil, const std::string& dataType,
+                                    const std::vector<ssc::SensorUid>& suids, const std::string& package,
+                                    sns_std_sensor_stream_type streamType) {
   for (const ssc::SensorUid& suid : suids) {
+    sns_std_attr_event attributes;
+    if (!Calibrator::LoadCandidate(attributeUtil, dataType, suid, &attributes)) continue;
     bool isOfType = false;
     std::string itsPackage;
-    if (readPackage(attributeUtil, suid, streamType, &isOfType, &itsPackage) != ssc::kOk) continue;
+    if (packageOf(attributes, streamType, &isOfType, &itsPackage) != ssc::kOk) continue;
     if (isOfType && itsPackage == package) return &suid;
   }
   return nullptr;
@@ -137,6 +144,15 @@ void Calibrator::OnReconnect() {
   ssc::logFunc(kFunction, "<--");
 }
 
+bool Calibrator::LoadCandidate(ssc::AttrUtil& attributeUtil, const std::string& dataType,
+                               const ssc::SensorUid& suid, sns_std_attr_event* attributes) {
+  const int result = attributeUtil.LoadAttributes(suid, attributes);
+  if (result == ssc::kOk) return true;
+  ssc::log(ssc::kLogWarn, "Unable to read the attributes of a %s sensor. Error = %d", dataType.c_str(),
+           result);
+  return false;
+}
+
 void Calibrator::SensorNameToPackageName(std::string* name) {
   if (name == nullptr) return;
   std::size_t end = name->find(' ');
@@ -165,7 +181,7 @@ int Calibrator::LookupSuidsByName(const std::vector<std::string>& dataTypes,
       if (result != ssc::kOk) return result;
     }
     if (package.empty()) continue;
-    const ssc::SensorUid* const suid = findInPackage(attributeUtil, found, package, streamType);
+    const ssc::SensorUid* const suid = findInPackage(attributeUtil, dataType, found, package, streamType);
     if (suid == nullptr) {
       ssc::log(ssc::kLogError, "Unable to find %s for %s", dataType.c_str(), package.c_str());
       return ssc::kNotFound;
@@ -185,7 +201,7 @@ bool Calibrator::LookupCompanion(const ssc::SensorUid& sensor, const std::string
   std::string package;
   if (readPackage(attributeUtil, sensor, streamType, &isOfType, &package) != ssc::kOk || !isOfType)
     return false;
-  const ssc::SensorUid* const suid = findInPackage(attributeUtil, found, package, streamType);
+  const ssc::SensorUid* const suid = findInPackage(attributeUtil, dataType, found, package, streamType);
   if (suid == nullptr) return false;
   *companion = *suid;
   return true;

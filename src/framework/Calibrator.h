@@ -23,6 +23,10 @@
 #include "ssc/Log.h"
 #include "ssc/RegistryUtil.h"
 
+namespace ssc {
+class AttrUtil;
+}
+
 class Calibrator : public ssc::Client {
  public:
   /// What the driver hands to a command.
@@ -61,6 +65,11 @@ class Calibrator : public ssc::Client {
   /// Cuts a sensor's name to its chip's: at the first blank, or, without one, at the first underscore. Null
   /// is ignored.
   static void SensorNameToPackageName(std::string* name);
+  /// The attributes of one of several sensors of `dataType` among which a command chooses. False, after a
+  /// level-1 message, where the hub does not tell them: the sensor is passed over, whereupon there may seem
+  /// to be none, and nothing else would say that one is there.
+  [[nodiscard]] static bool LoadCandidate(ssc::AttrUtil& attributeUtil, const std::string& dataType,
+                                          const ssc::SensorUid& suid, sns_std_attr_event* attributes);
 
  protected:
   /// Result of a ParseArgs that has printed the help: Run then ends with 0.

@@ -90,7 +90,7 @@ int SarCalibrator::selectSensor(const std::vector<ssc::SensorUid>& suids) {
     sns_std_attr_event attributes;
     std::int64_t index = 0;
     // A sensor that does not say which one it is cannot be the one wanted.
-    if (attributeUtil.LoadAttributes(suid, &attributes) != ssc::kOk ||
+    if (!LoadCandidate(attributeUtil, kSar, suid, &attributes) ||
         ssc::AttrUtil::GetSensorIndex(attributes, &index) != ssc::kOk || index != hardwareId_) {
       continue;
     }
