@@ -126,8 +126,12 @@ int ImuThermalCalibrator::CorrelateTemperature(const ssc::SensorUid& sensor,
   ssc::say("Correlating %s with %s...\n", info.name.c_str(), sensorInfo[temperature].name.c_str());
   InterpolateTemperature(sensor, temperature);
   const std::vector<float>& itsTemperatures = temperatures_[sensor];
-  if (itsTemperatures.size() < 2) {
+  constexpr std::size_t kNeeded = 2;
+  if (itsTemperatures.size() < kNeeded) {
     ssc::log(ssc::kLogError, "Insufficient data to perform linear regression");
+    ssc::log(ssc::kLogWarn, "Only %zu of at least %zu %s samples lie within the time of %zu %s samples",
+             itsTemperatures.size(), kNeeded, info.name.c_str(), samples[temperature].size(),
+             sensorInfo[temperature].name.c_str());
     return ssc::kNoData;
   }
   ThermalFit fit =

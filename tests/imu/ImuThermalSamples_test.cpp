@@ -54,8 +54,10 @@ TEST_F(ImuThermalTest, WithoutValidationItIsTheFitThatNeedsTemperatures) {
     EXPECT_EQ(captured.result, kNoData);
     EXPECT_EQ(captured.err, "ERROR: Insufficient data to perform linear regression\n");
     EXPECT_THAT(captured.out, HasSubstr("Collecting samples...\nChecking for bumps...\n"));
-    EXPECT_THAT(captured.out,
-                EndsWith(std::string("Correlating Accelerometer with IMU Temperature...\n") + kFailed));
+    EXPECT_THAT(captured.out, EndsWith(std::string("Correlating Accelerometer with IMU Temperature...\n"
+                                                   "WARN: Only 0 of at least 2 Accelerometer samples lie "
+                                                   "within the time of 0 IMU Temperature samples\n") +
+                                       kFailed));
   }
 }
 
@@ -123,8 +125,12 @@ TEST_F(ImuThermalTest, EventsWithTooFewAxesAreDropped) {
   EXPECT_EQ(captured.result, kNoData);
   EXPECT_THAT(captured.out,
               HasSubstr("WARN: Dropping Gyroscope events with fewer than 3 values (this is said once)\n"));
-  EXPECT_THAT(captured.out,
-              EndsWith("Correlating Gyroscope with IMU Temperature...\n" + std::string(kFailed)));
+  EXPECT_THAT(
+      captured.out,
+      EndsWith("Correlating Gyroscope with IMU Temperature...\n"
+               "WARN: Only 0 of at least 2 Gyroscope samples lie within the time of 10 IMU Temperature "
+               "samples\n" +
+               std::string(kFailed)));
   // The accelerometer's model was stored before, and stays.
   EXPECT_EQ(stored(kAccelScale).size(), 3U);
   EXPECT_TRUE(stored(kGyroScale).empty());
