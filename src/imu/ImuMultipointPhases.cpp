@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "framework/RegistryItems.h"
+#include "framework/Statistics.h"
 #include "imu/ImuMultipointCalibrator.h"
 #include "imu/ImuMultipointRegistry.h"
 #include "imu/ImuMultipointSamples.h"
@@ -144,6 +145,15 @@ SampleData ImuMultipointCalibrator::measureSteadyRate() const {
     ssc::log(ssc::kLogError,
              "Heavy fluctuation detected on gyro data during steady rotating phase, please check if rotation "
              "station is functioning properly");
+    ssc::log(ssc::kLogWarn, "The rates about the %c-axis differ by %f rad/s, more than %f rad/s",
+             axisLetter(steady.axis), static_cast<double>(steady.fluctuation),
+             static_cast<double>(steady.allowedFluctuation));
+  } else if (steady.fault == SteadyRate::Fault::kNoSamples) {
+    ssc::log(
+        ssc::kLogWarn,
+        "None of %zu gyro samples is of a steady rotation: their mean rate about the %c-axis is %f rad/s",
+        collected->second.size(), axisLetter(steady.axis),
+        static_cast<double>(withPlainNan(steady.meanRate)));
   }
   return steady.fault == SteadyRate::Fault::kNone ? std::move(steady.rate) : SampleData();
 }

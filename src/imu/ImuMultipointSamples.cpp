@@ -99,6 +99,7 @@ SteadyRate findSteadyRate(const std::vector<Sample>& gyro, float windowSeconds) 
 
   const SampleData mean = sampleDataMean(gyro);
   const std::size_t axis = steady.axis = largestAxis(mean);
+  steady.meanRate = mean[axis];
   std::vector<Sample> kept;
   std::copy_if(gyro.begin(), gyro.end(), std::back_inserter(kept),
                [&](const Sample& sample) { return std::fabs(sample.values[axis]) > std::fabs(mean[axis]); });
@@ -120,8 +121,9 @@ SteadyRate findSteadyRate(const std::vector<Sample>& gyro, float windowSeconds) 
   const auto [smallest, largest] = std::minmax_element(
       kept.begin(), kept.end(),
       [axis](const Sample& a, const Sample& b) { return a.values[axis] < b.values[axis]; });
-  const float fluctuation = largest->values[axis] - smallest->values[axis];
-  const bool isSteady = !(0.25F * std::fabs(steady.rate[axis]) < fluctuation);
+  steady.fluctuation = largest->values[axis] - smallest->values[axis];
+  steady.allowedFluctuation = 0.25F * std::fabs(steady.rate[axis]);
+  const bool isSteady = !(steady.allowedFluctuation < steady.fluctuation);
   steady.fault = isSteady ? SteadyRate::Fault::kNone : SteadyRate::Fault::kFluctuation;
   return steady;
 }

@@ -85,9 +85,12 @@ struct SteadyRate {
   Fault fault = Fault::kNone;
   bool windowFound = false;  ///< start, end and rate are meaningful
   std::size_t axis = 0;      ///< the rotating one
+  float meanRate = 0;        ///< rad/s about that, of all samples
   double start = 0;          ///< s, bounds of the window
   double end = 0;
   SampleData rate;
+  float fluctuation = 0;         ///< rad/s, between the slowest and the fastest sample of the window
+  float allowedFluctuation = 0;  ///< rad/s
 };
 
 /// The mean rate over the steady part. The rotating axis is that with the largest absolute mean (the first on
