@@ -38,9 +38,11 @@ void ClearIntermediateFiles() {
   ssc::log(ssc::kLogInfo, "Clearing existing intermediate IMU calibration data.");
   for (const char* file : files) {
     ssc::log(ssc::kLogDebug, "Removing file: %s", file);
-    if (ssc::removeWorkingFile(ssc::devicePath(file)) == 0) continue;
-    // Records of an earlier calibration would be taken for this one's.
-    ssc::log(ssc::kLogWarn, "Unable to remove file: %s", file);
+    const int result = ssc::removeWorkingFile(ssc::devicePath(file));
+    if (result == ssc::kOk) continue;
+    // Whoever calibrates has to know: the step goes on all the same.
+    ssc::log(ssc::kLogWarn, "Unable to remove file: %s: %s", file, std::strerror(-result));
+    ssc::log(ssc::kLogWarn, "What it holds of an earlier calibration will be taken for this one's");
   }
 }
 

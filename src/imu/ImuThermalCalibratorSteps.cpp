@@ -1,7 +1,9 @@
 // What imu-thermal does with the samples it has collected: validation, bumps, the models and their storing.
 #include <algorithm>
+#include <cerrno>
 #include <cinttypes>
 #include <cmath>
+#include <cstring>
 
 #include <unistd.h>
 
@@ -224,9 +226,13 @@ int ImuThermalCalibrator::Reset() {
   ssc::say("Resetting IMU thermal calibration...\n");
   for (const char* const sensorWord : {"accel", "gyro"}) {
     for (const char* const itemWord : {kScale, kBias}) {
+      const std::string group = groupName(sensorWord, itemWord);
       std::string path;
-      // A model that was never stored has no file.
-      if (registryFilePath(groupName(sensorWord, itemWord), &path) == ssc::kOk) (void)::unlink(path.c_str());
+      if (registryFilePath(group, &path) != ssc::kOk || ::unlink(path.c_str()) == 0) continue;
+      // A model that was never stored has no file. One that stays is no failure, but goes on to count.
+      if (errno == ENOENT) continue;
+      ssc::log(ssc::kLogWarn, "Unable to delete the registry file %s: %s", group.c_str(),
+               std::strerror(errno));
     }
   }
   ssc::say("Reboot device for default calibration to take effect.\n");

@@ -123,6 +123,17 @@ TEST_F(ImuMultipointTest, FirstWithoutAPhaseOnlyClears) {
   EXPECT_FALSE(hasFile());
 }
 
+TEST_F(ImuMultipointTest, RecordsThatCannotBeRemovedAreAWarningWithTheCause) {
+  perPhase();
+  std::filesystem::create_directories(path);  // nothing that is a file could be there
+  const Captured captured = run({"imu-multipoint", "first"});
+  EXPECT_EQ(captured.result, 0);
+  EXPECT_THAT(captured.out,
+              HasSubstr("WARN: Unable to remove file: /data/app-ephemeral/vantle_imu: Is a "
+                        "directory\nWARN: What it holds of an earlier calibration will be taken "
+                        "for this one's\n"));
+}
+
 TEST_F(ImuMultipointTest, AStepWithoutAPhaseCollectsNothing) {
   perPhase();
   const Captured captured = run({"imu-multipoint"});

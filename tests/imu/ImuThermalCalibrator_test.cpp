@@ -1,4 +1,9 @@
+#include <cstdlib>
+#include <filesystem>
+
 #include "imu/ImuThermalTest.h"
+#include "ssc/RegistryUtil.h"
+#include "support/TemporaryFolder.h"
 
 namespace {
 
@@ -251,6 +256,21 @@ TEST_F(ImuThermalResetTest, AsksTheHubNothingAndLooksAtNoOtherWord) {
             "Resetting IMU thermal calibration...\n"
             "Reboot device for default calibration to take effect.\n");
   EXPECT_TRUE(script->requests.empty());
+}
+
+TEST_F(ImuThermalResetTest, AModelThatCannotBeDeletedIsAWarning) {
+  const support::TemporaryFolder root;
+  ::setenv("VANTLE_ROOT", root.path().c_str(), 1);
+  // Nothing that is a file could be there.
+  std::filesystem::create_directories(root.path().string() + ssc::RegistryUtil::RegistryPath() +
+                                      "dynamic.fac_cal.gyro.thermal.bias");
+  const Captured captured = run({"imu-thermal"});
+  ::unsetenv("VANTLE_ROOT");
+  EXPECT_EQ(captured.result, 0);
+  EXPECT_EQ(captured.out,
+            "Resetting IMU thermal calibration...\n"
+            "WARN: Unable to delete the registry file dynamic.fac_cal.gyro.thermal.bias: Is a directory\n"
+            "Reboot device for default calibration to take effect.\n");
 }
 
 }  // namespace
