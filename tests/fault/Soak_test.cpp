@@ -2,7 +2,9 @@
 // stored value is lost, nobody sees what is another's. How many is VANTLE_SOAK (scripts/soak), by default
 // few.
 #include <algorithm>
+#include <array>
 #include <chrono>
+#include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
@@ -57,6 +59,14 @@ const std::vector<Writer>& writers() {
   return all;
 }
 
+/// Commands that store nothing.
+const std::vector<std::vector<std::string>>& measurements() {
+  static const std::vector<std::vector<std::string>> all{{"-q", "als", "-c", "-s", "2", "-v", "90", "300"},
+                                                         {"-q", "-n", "prox", "far"},
+                                                         {"-n", "-q", "als", "300"}};
+  return all;
+}
+
 std::size_t commandCount() {
   const char* const text = std::getenv("VANTLE_SOAK");  // NOLINT: no threads yet
   const long count = text != nullptr ? std::strtol(text, nullptr, 10) : 0;
@@ -81,6 +91,14 @@ Footprint footprintOf(pid_t process) {
     ++footprint.descriptors;
   }
   return footprint;
+}
+
+/// How many commands a second ended since then, to a tenth.
+std::string rateSince(std::chrono::steady_clock::time_point begin, std::size_t commands) {
+  const std::chrono::duration<double> passed = std::chrono::steady_clock::now() - begin;
+  std::array<char, 32> text;
+  std::snprintf(text.data(), text.size(), "%.1f a second", static_cast<double>(commands) / passed.count());
+  return text.data();
 }
 
 class Soak : public testing::Test {
@@ -121,6 +139,25 @@ class Soak : public testing::Test {
     return 0;
   }
 
+  /// The hub's, once it has noticed that those who were served before are gone: it serves one more.
+  [[nodiscard]] Footprint footprintAtRest() const {
+    const support::Outcome outcome = vantle(measurements().front());
+    EXPECT_TRUE(outcome.exitedWith(0)) << outcome.describe() << outcome.output << outcome.errors;
+    return footprintOf(hub.pid());
+  }
+
+  void expectSameFootprint(const Footprint& begin, const Footprint& end) {
+    // The last client may not have been noticed to be gone.
+    EXPECT_LE(end.descriptors, begin.descriptors + 1);
+    if (kMemoryIsOwn) {
+      EXPECT_LE(end.residentKiB, begin.residentKiB + kGrowthKiB);
+    }
+    RecordProperty("residentKiB",
+                   std::to_string(begin.residentKiB) + " to " + std::to_string(end.residentKiB));
+    RecordProperty("descriptors",
+                   std::to_string(begin.descriptors) + " to " + std::to_string(end.descriptors));
+  }
+
   support::TemporaryFolder folder;
   support::Process hub;
 };
@@ -129,39 +166,33 @@ TEST_F(Soak, ManyCommandsInARowLeaveTheHubAsItWas) {
   const std::size_t count = commandCount();
   const std::size_t warm = std::max(count / 10, writers().size());
   Footprint begin;
+  const auto start = std::chrono::steady_clock::now();
   for (std::size_t i = 0; i < count; ++i) {
     const support::Outcome outcome = vantle(writers()[i % writers().size()].words);
     ASSERT_TRUE(outcome.exitedWith(0))
         << "command " << i << ": " << outcome.describe() << outcome.output << outcome.errors;
     if (i == warm) begin = footprintOf(hub.pid());
   }
-  const Footprint end = footprintOf(hub.pid());
-  // The last client may not have been noticed to be gone.
-  EXPECT_LE(end.descriptors, begin.descriptors + 1);
-  if (kMemoryIsOwn) {
-    EXPECT_LE(end.residentKiB, begin.residentKiB + kGrowthKiB);
-  }
+  RecordProperty("commands", std::to_string(count));
+  RecordProperty("rate", rateSince(start, count));
+  expectSameFootprint(begin, footprintOf(hub.pid()));
   for (std::size_t i = 0; i < writers().size(); ++i) {
     const std::size_t runs = count / writers().size() + (i < count % writers().size() ? 1 : 0);
     EXPECT_EQ(version(writers()[i]), static_cast<std::int32_t>(runs)) << writers()[i].group;
   }
-  RecordProperty("commands", std::to_string(count));
-  RecordProperty("residentKiB", std::to_string(begin.residentKiB) + " to " + std::to_string(end.residentKiB));
-  RecordProperty("descriptors", std::to_string(begin.descriptors) + " to " + std::to_string(end.descriptors));
 }
 
 TEST_F(Soak, ManyCommandsAtOnceLoseNothing) {
   // A lane for each that writes, and as many that only measure; each writes its own group.
   const std::size_t rounds = std::max<std::size_t>(commandCount() / (kAtOnce * 4), 2);
-  const std::vector<std::vector<std::string>> measurements{{"-q", "als", "-c", "-s", "2", "-v", "90", "300"},
-                                                           {"-q", "-n", "prox", "far"},
-                                                           {"-n", "-q", "als", "300"}};
   std::vector<std::string> failures(kAtOnce);
   std::vector<std::thread> lanes;
+  const Footprint begin = footprintAtRest();
+  const auto start = std::chrono::steady_clock::now();
   for (std::size_t lane = 0; lane < kAtOnce; ++lane) {
     lanes.emplace_back([&, lane] {
       const std::vector<std::string>& words =
-          lane < writers().size() ? writers()[lane].words : measurements[lane % measurements.size()];
+          lane < writers().size() ? writers()[lane].words : measurements()[lane % measurements().size()];
       for (std::size_t round = 0; round < rounds && failures[lane].empty(); ++round) {
         const support::Outcome outcome = vantle(words);
         if (!outcome.exitedWith(0)) failures[lane] = outcome.describe() + outcome.output + outcome.errors;
@@ -169,7 +200,10 @@ TEST_F(Soak, ManyCommandsAtOnceLoseNothing) {
     });
   }
   for (std::thread& lane : lanes) lane.join();
+  RecordProperty("commands", std::to_string(rounds * kAtOnce));
+  RecordProperty("rate", rateSince(start, rounds * kAtOnce));
   for (const std::string& failure : failures) EXPECT_EQ(failure, "");
+  expectSameFootprint(begin, footprintAtRest());
   for (const Writer& writer : writers()) {
     EXPECT_EQ(version(writer), static_cast<std::int32_t>(rounds)) << writer.group;
   }
