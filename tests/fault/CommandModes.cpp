@@ -1,4 +1,3 @@
-#include <array>
 #include <cctype>
 #include <utility>
 
@@ -8,9 +7,6 @@ namespace fault {
 namespace {
 
 using Words = std::vector<std::string>;
-
-/// From 30 to 45 °C within half a minute, as no handset warms up: a quick thermal sweep.
-const std::string kSweep = "world.temperature=[{at=0,value=30},{at=0.5,value=45,ramp=30}]";
 
 void addAls(std::vector<CommandMode>* modes) {
   CommandMode mode;
@@ -40,6 +36,10 @@ void addAls(std::vector<CommandMode>* modes) {
   mode.begins = "Verifying ALS calibration";
   mode.closes = "ALS verification";
   mode.item = "";  // without a factor the readings count as they are
+  modes->push_back(mode);
+
+  mode.name = "verify as it is";
+  mode.words = {"als", "-c", "-v", "20", "300"};
   modes->push_back(mode);
 
   mode.name = "reset";
@@ -113,6 +113,8 @@ void addBaro(std::vector<CommandMode>* modes) {
   mode.words = {"baro", "1013.25"};
   modes->push_back(mode);
 
+  const CommandMode raw = mode;
+
   CommandMode calibrated = mode;
   calibrated.name = "calibrated";
   calibrated.device = "e4d4";
@@ -128,10 +130,12 @@ void addBaro(std::vector<CommandMode>* modes) {
 
   mode.name = "reset";
   mode.words = {"-r", "baro"};
+  mode.notice = Notice::kNone;
   mode.streamed = mode.begins = mode.closes = "";
   mode.ending = Ending::kNoSamples;
   mode.storesInRegistry = true;
   modes->push_back(mode);
+  addOthersStruck(raw, {{"pressure_temperature", "thermometer"}}, modes);
 }
 
 void addMag(std::vector<CommandMode>* modes) {
@@ -152,6 +156,8 @@ void addMag(std::vector<CommandMode>* modes) {
   mode.words = {"mag", "--", "0", "22", "-42"};
   modes->push_back(mode);
 
+  const CommandMode raw = mode;
+
   CommandMode calibrated = mode;
   calibrated.name = "calibrated";
   calibrated.device = "e4d4";
@@ -167,10 +173,12 @@ void addMag(std::vector<CommandMode>* modes) {
 
   mode.name = "reset";
   mode.words = {"-r", "mag"};
+  mode.notice = Notice::kNone;
   mode.streamed = mode.begins = mode.closes = "";
   mode.ending = Ending::kNoSamples;
   mode.storesInRegistry = true;
   modes->push_back(mode);
+  addOthersStruck(raw, {{"temperature_mag", "thermometer"}}, modes);
 }
 
 void addMagConfiguration(std::vector<CommandMode>* modes) {
@@ -214,154 +222,37 @@ void addMagConfiguration(std::vector<CommandMode>* modes) {
     mode.before = {};
     modes->push_back(mode);
 
-    // Deletes what was stored, without asking the hub.
-    mode.name = "reset";
-    mode.before = {{mode.words, {}}};
-    mode.words = {"-r", row.family};
-    mode.group = "";
-    modes->push_back(mode);
+    // Deletes what was stored; the hub is asked for the sensor's name alone.
+    CommandMode reset = mode;
+    reset.name = "reset";
+    reset.before = {{mode.words, {}}};
+    reset.words = {"-r", row.family};
+    reset.group = reset.begins = reset.closes = "";
+    reset.deletesOnce = mode.family != "mag-sensitivity";
+    modes->push_back(reset);
+    if (mode.family != "mag-sensitivity") continue;
+
+    reset.name = "clear one speed";
+    reset.words = {row.family, "-c", "fast"};
+    reset.closes = row.closes;
+    modes->push_back(reset);
   }
-}
-
-struct Pose {
-  const char* phase;
-  const char* angles;
-};
-constexpr std::array<Pose, 6> kPoses{{{"a+x", "[0,-90,0]"},
-                                      {"a-x", "[0,90,0]"},
-                                      {"a+y", "[90,0,0]"},
-                                      {"a-y", "[-90,0,0]"},
-                                      {"a+z", "[0,0,0]"},
-                                      {"a-z", "[180,0,0]"}}};
-
-Words inPose(const Pose& pose, std::size_t seed) {
-  return {std::string("world.pose=") + pose.angles, "hub.seed=" + std::to_string(seed)};
-}
-
-Words turning(const Pose& pose, const std::string& axis, std::size_t seed) {
-  Words world = inPose(pose, seed);
-  for (const char* turn : {"rate=180", "angle=180", "at=0.3", "ramp=0.2"}) {
-    world.push_back(std::string("world.rotation.") + turn);
-  }
-  world.push_back("world.rotation.axis=" + axis);
-  return world;
-}
-
-void addPositional(CommandMode mode, std::vector<CommandMode>* modes) {
-  mode.device = "o1v1";
-  mode.name = "position";
-  mode.words = {"imu-multipoint"};
-  mode.world = inPose(kPoses[1], 2);
-  mode.before = {{{"imu-multipoint", "first"}, inPose(kPoses[0], 1)}};
-  modes->push_back(mode);
-
-  mode.name = "last position";
-  mode.words = {"imu-multipoint", "last"};
-  mode.world = inPose(kPoses[5], 6);
-  mode.before = {};
-  for (std::size_t i = 0; i < 5; ++i) {
-    mode.before.push_back(
-        {i == 0 ? Words{"imu-multipoint", "first"} : Words{"imu-multipoint"}, inPose(kPoses[i], i + 1)});
-  }
-  mode.group = "imuchip_0_platform.accel.fac_cal";
-  mode.item = "corr_mat";
-  mode.notice = Notice::kWarning;
-  mode.storesInRegistry = true;
-  modes->push_back(mode);
-
-  mode.name = "reset";
-  mode.keepsRecords = false;
-  mode.words = {"-r", "imu-multipoint"};
-  mode.world = {};
-  mode.before = {};
-  mode.streamed = mode.begins = mode.closes = "";
-  mode.ending = Ending::kNoSamples;
-  mode.notice = Notice::kNone;
-  modes->push_back(mode);
-}
-
-void addPerPhase(CommandMode mode, std::vector<CommandMode>* modes) {
-  mode.device = "p2m2";
-  mode.name = "phase";
-  mode.words = {"-q", "imu-multipoint", "-p", "a-x"};
-  mode.world = inPose(kPoses[1], 2);
-  mode.before = {{{"-q", "imu-multipoint", "-p", "a+x", "first"}, inPose(kPoses[0], 1)}};
-  modes->push_back(mode);
-
-  mode.name = "turn";
-  mode.streamed = "gyro";
-  mode.words = {"-q", "imu-multipoint", "-p", "g+x"};
-  mode.world = turning(kPoses[0], "x", 2);
-  modes->push_back(mode);
-
-  mode.name = "last phase";
-  mode.streamed = "accel";
-  mode.words = {"-q", "imu-multipoint", "-p", "a-z"};
-  for (const char* axis : {"x", "y", "z"}) {
-    mode.words.push_back(std::string("--a+") + axis + "-ref" + axis);
-    mode.words.emplace_back("9.80665");
-    mode.words.push_back(std::string("--g+") + axis + "-ref" + axis);
-    mode.words.emplace_back("3.14159265");
-  }
-  mode.words.emplace_back("last");
-  mode.world = inPose(kPoses[5], 9);
-  mode.before = {{{"imu-multipoint", "first"}, {}}};
-  for (std::size_t axis = 0; axis < 3; ++axis) {
-    const std::string name(1, "xyz"[axis]);
-    const auto phase = [](const std::string& text) { return Words{"-q", "imu-multipoint", "-p", text}; };
-    mode.before.push_back({phase("a+" + name), inPose(kPoses[2 * axis], 3 * axis)});
-    mode.before.push_back({phase("g+" + name), turning(kPoses[2 * axis], name, 3 * axis + 1)});
-    if (axis < 2) mode.before.push_back({phase("a-" + name), inPose(kPoses[2 * axis + 1], 3 * axis + 2)});
-  }
-  mode.group = "imuchip2_0_platform.accel.fac_cal";
-  mode.item = "corr_mat";
-  mode.notice = Notice::kWarning;
-  mode.storesInRegistry = true;
-  modes->push_back(mode);
-}
-
-void addImuMultipoint(std::vector<CommandMode>* modes) {
-  CommandMode mode;
-  mode.family = "imu-multipoint";
-  mode.lookedUp = mode.streamed = "accel";
-  mode.ending = Ending::kTime;
-  mode.keepsRecords = true;
-  mode.begins = "uing IMU multi-point calibration";
-  mode.closes = "IMU multi-point calibration";
-  addPositional(mode, modes);
-  addPerPhase(mode, modes);
-}
-
-void addImuThermal(std::vector<CommandMode>* modes) {
-  CommandMode mode;
-  mode.family = "imu-thermal";
-  mode.device = "o1v1";
-  mode.words = {"-q", "imu-thermal", "40"};
-  mode.world = {kSweep};
-  mode.lookedUp = mode.streamed = "accel";
-  mode.group = "dynamic.fac_cal.accel.thermal.scale";
-  mode.ending = Ending::kTime;
-  mode.storesInRegistry = true;
-  mode.begins = "IMU thermal calibration begins";
-  mode.closes = "IMU thermal calibration";
-
-  mode.name = "merging";
-  mode.before = {{mode.words, mode.world}};
-  modes->push_back(mode);
-
-  mode.name = "raw";
-  mode.device = "t5h5";
-  mode.before = {};
-  modes->push_back(mode);
-
-  mode.name = "dry run";
-  mode.device = "o1v1";
-  mode.words = {"-n", "-q", "imu-thermal", "40"};
-  mode.storesInRegistry = false;
-  modes->push_back(mode);
 }
 
 }  // namespace
+
+void addOthersStruck(const CommandMode& mode, std::initializer_list<OtherSensor> others,
+                     std::vector<CommandMode>* modes) {
+  for (const OtherSensor& other : others) {
+    CommandMode struck = mode;
+    struck.struck = other.name;
+    struck.lookedUp = struck.streamed = other.key;
+    struck.notice = other.notice;
+    if (other.loss == OtherSensor::Loss::kShown) struck.ending = Ending::kShown;
+    struck.storesOnTheWay = other.loss == OtherSensor::Loss::kLate;
+    modes->push_back(struck);
+  }
+}
 
 const std::vector<CommandMode>& commandModes() {
   static const std::vector<CommandMode> modes = [] {
@@ -376,8 +267,8 @@ const std::vector<CommandMode>& commandModes() {
     addBaro(&all);
     addMag(&all);
     addMagConfiguration(&all);
-    addImuMultipoint(&all);
-    addImuThermal(&all);
+    addImuMultipointModes(&all);
+    addImuThermalModes(&all);
     return all;
   }();
   return modes;

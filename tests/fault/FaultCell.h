@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "fault/CommandModes.h"
+#include "fault/FaultChecks.h"
 #include "fault/FaultRows.h"
 #include "fault/HandsetFiles.h"
 #include "fault/WatchedRun.h"
@@ -15,8 +16,7 @@ namespace fault {
 
 struct FaultCell {
   int result = 0;
-  /// What is wrong with it, each with what was printed; empty: everything is as it must be.
-  std::vector<std::string> problems;
+  Problems problems;  ///< each with what was printed; empty: everything is as it must be
 };
 
 /// A handset on which a command is about to run in one of its modes; every cell starts from a copy of it.
@@ -25,24 +25,24 @@ class ModeUnderTest {
   explicit ModeUnderTest(const CommandMode& mode);
 
   /// The command on a good hub: its problems are those of the matrix itself.
-  [[nodiscard]] const FaultCell& good() const { return good_; }
+  [[nodiscard]] const FaultCell& good() const { return goodCell_; }
   /// Nothing where the fault cannot happen to the command.
   [[nodiscard]] std::optional<FaultCell> Try(const FaultRow& row) const;
 
  private:
   [[nodiscard]] WatchedRun run(const std::filesystem::path& root,
                                const std::vector<std::string>& overrides) const;
-  void checkOutput(const WatchedRun& run, const Expected& expected, FaultCell* cell) const;
-  void checkTime(const WatchedRun& run, FaultCell* cell) const;
-  void checkRegistry(const Files& before, const Files& after, Stored stored, FaultCell* cell) const;
+  /// Whether and what a run that ended so may have stored.
+  [[nodiscard]] Stored storedBy(int result, const FaultRow& row) const;
   /// The command has to succeed on what the fault has left behind.
-  void checkRecovery(const std::filesystem::path& root, FaultCell* cell) const;
+  [[nodiscard]] Problems checkRecovery(const std::filesystem::path& root) const;
 
   const CommandMode& mode_;
   support::TemporaryFolder ready_;       ///< as the command finds it
   support::TemporaryFolder calibrated_;  ///< as it leaves it
-  Traffic traffic_;                      ///< on a good hub
-  FaultCell good_;
+  RegistryStates registry_;
+  WatchedRun good_;
+  FaultCell goodCell_;
 };
 
 }  // namespace fault

@@ -27,7 +27,11 @@ enum MomentIndex : std::size_t { kFirst, kMiddle, kAfter, kMomentCount };
 
 /// Whether a collection ends with the last sample wanted.
 [[nodiscard]] bool counts(const CommandMode& mode);
-[[nodiscard]] bool measuresPulses(const CommandMode& mode);
+[[nodiscard]] bool computesPulses(const CommandMode& mode);
+/// Whether it measures a rotation.
+[[nodiscard]] bool turns(const CommandMode& mode);
+/// Whether the sensor that is struck is a thermometer.
+[[nodiscard]] bool isThermometer(const CommandMode& mode);
 
 /// What comes of readings that do not come, or do not count.
 [[nodiscard]] Expected lost(const CommandMode& mode, std::size_t moment);

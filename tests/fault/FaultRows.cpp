@@ -6,7 +6,7 @@ namespace {
 
 /// The phase's pose is checked first, and readings that are not there are in none.
 bool checksPose(const CommandMode& mode) {
-  return mode.Is("imu-multipoint phase") || mode.Is("imu-multipoint last phase");
+  return mode.device == "p2m2" && mode.family == "imu-multipoint" && !turns(mode);
 }
 
 }  // namespace
@@ -34,27 +34,39 @@ bool counts(const CommandMode& mode) { return mode.ending == Ending::kSampleCoun
 
 Expected lost(const CommandMode& mode, std::size_t moment) {
   if (moment == kAfter) return {};
-  if (counts(mode)) return {ssc::kTimedOut, mode.family == "color" ? "" : "Timed out waiting for"};
-  if (moment == kMiddle) return {};
-  if (checksPose(mode)) return {ssc::kInvalid, "Stationary accel data validation failed"};
-  return {ssc::kNoData, ""};
+  if (counts(mode)) {
+    return {ssc::kTimedOut,
+            mode.family == "color" ? "samples were received in time" : "Timed out waiting for"};
+  }
+  if (moment == kMiddle || mode.ending == Ending::kShown) return {};
+  if (checksPose(mode) && mode.streamed == "accel") return nothingCame(mode);
+  const bool isFitted = mode.family == "imu-thermal" && !isThermometer(mode);
+  return {ssc::kNoData, isFitted ? "Insufficient data" : "samples were"};
 }
 
 Expected nothingCame(const CommandMode& mode) {
+  if (counts(mode)) return lost(mode, kFirst);
+  if (checksPose(mode)) return {ssc::kInvalid, "Stationary accel data validation failed"};
   // Verifies each sensor that came, and then misses what it was about.
-  if (mode.Is("imu-multipoint turn")) return {ssc::kInvalid, "unable to obtain rotation data"};
-  return lost(mode, kFirst);
+  if (turns(mode)) return {ssc::kInvalid, "unable to obtain rotation data"};
+  return {ssc::kNoData, "samples were"};
 }
 
-bool measuresPulses(const CommandMode& mode) {
-  return mode.Is("prox under the display pulse number") || mode.Is("prox under the display pulse current");
+bool turns(const CommandMode& mode) {
+  return mode.Is("imu-multipoint turn") || mode.Is("imu-multipoint turn at a rate");
 }
+
+bool computesPulses(const CommandMode& mode) { return mode.item == "ppulse" || mode.item == "pldrive"; }
+
+bool storesPulses(const CommandMode& mode) { return computesPulses(mode) && mode.storesInRegistry; }
+
+bool isThermometer(const CommandMode& mode) { return mode.struck.find("thermometer") != std::string::npos; }
 
 bool saysNoMore(const CommandMode& mode) { return mode.group == "lightchip_0_platform.als.fac_cal"; }
 
 Expected collectionFails(const CommandMode& mode, int result, const std::string& says) {
   // Stores 0 then, and calls that success: production lines rely on it.
-  if (measuresPulses(mode)) return {};
+  if (storesPulses(mode)) return {};
   if (saysNoMore(mode)) return {result, "", Reason::kUnsaid};
   return {result, says};
 }

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <sstream>
 #include <system_error>
 #include <vector>
 
@@ -50,6 +51,17 @@ std::string faultOfLines(const std::filesystem::path&, const std::string& conten
   return content.back() == '\n' ? "" : "ends in the middle of a line";
 }
 
+/// Eight numbers: whatever of an older table a shorter one has left stands behind them.
+std::string faultOfDisplayTable(const std::filesystem::path&, const std::string& content) {
+  constexpr int kNumbers = 8;
+  std::istringstream text(content);
+  for (int i = 0; i < kNumbers; ++i) {
+    unsigned number = 0;
+    if (!(text >> number)) return "is no table of the display";
+  }
+  return "";
+}
+
 /// A file that outlives a step, below the handset's root.
 struct WorkingFile {
   const char* path;
@@ -69,7 +81,10 @@ constexpr WorkingFile kWorkingFiles[] = {
     {"persist/sensors/als.csv", kLog, faultOfLines},
     {"persist/sensors/als_gain_cal.csv", kGrowingLog, faultOfLines},
     {"persist/sensors/als_pwm_cal.csv", kGrowingLog, faultOfLines},
+    {"persist/sensors/als_pattern_cal.csv", kGrowingLog, faultOfLines},
     {"persist/sensors/als_delay_cal.csv", kLog, faultOfLines},
+    {"persist/sensors/als_te2_delay_cal.csv", kLog, faultOfLines},
+    {"sys/devices/platform/soc/soc:qcom,dsi-display-primary/te2_table", kLog, faultOfDisplayTable},
 };
 
 }  // namespace

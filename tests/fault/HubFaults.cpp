@@ -29,9 +29,7 @@ Made awayTimes(const CommandMode& mode, const Traffic& good, const char* times) 
 
 /// Whatever comes after the collection cannot be sent.
 Expected cutOff(const CommandMode& mode, int result) {
-  // These read the registry after the collection.
-  const bool asksOn = mode.storesInRegistry || mode.family == "imu-thermal" || mode.Is("color verify");
-  if (!asksOn) return {};
+  if (!mode.storesInRegistry && !mode.asksAfterwards) return {};
   if (mode.Is("als calibrate")) return {result, "", Reason::kUnsaid};
   return {result, ""};
 }
@@ -43,10 +41,11 @@ void addHubRows(std::vector<FaultRow>* rows) {
   addHubRow(
       "gone from the start",
       [](const CommandMode&, const Traffic&) -> Made { return faultOf("hub_away", {}); },
-      [](const CommandMode&) {
-        return Expected{ssc::kNotConnected, "Unable to"};
+      [](const CommandMode& mode) {
+        return mode.lookedUp.empty() ? Expected{} : Expected{ssc::kNotConnected, "Unable to"};
       },
       rows);
+  rows->back().mayHaveBegun = false;
   addHubRow(
       "goes before the first reading, for good",
       [](const CommandMode& mode, const Traffic& good) { return awayFrom(mode, kFirst, good, {}); },

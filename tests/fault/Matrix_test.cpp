@@ -38,7 +38,9 @@ TEST_P(FaultMatrix, CommandWithstandsEveryFault) {
       ADD_FAILURE() << faultRows()[i].name << ": " << problem;
     }
   }
-  EXPECT_GE(tried, 10U) << "a command that hardly a fault can happen to is not tried at all";
+  // Without the hub a command has nothing to fear from it but that it is gone.
+  EXPECT_GE(tried, commandModes()[GetParam()].lookedUp.empty() ? 1U : 10U)
+      << "a command that hardly a fault can happen to is not tried at all";
 }
 
 std::string testName(const testing::TestParamInfo<std::size_t>& mode) {

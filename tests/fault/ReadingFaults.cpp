@@ -12,6 +12,34 @@ bool measuresOffsets(const CommandMode& mode) {
   return mode.family == "prox with offset" || mode.family == "prox under the display";
 }
 
+/// Whether it needs values that stand behind others.
+bool takesRawValues(const CommandMode& mode) { return mode.Is("imu-thermal raw") && !isThermometer(mode); }
+
+/// Whether the accuracy of the sensor's readings does not matter.
+bool countsInaccurate(const CommandMode& mode) {
+  return mode.family == "baro" || (isThermometer(mode) && mode.family != "imu-multipoint");
+}
+
+Expected notANumber(const CommandMode& mode, std::size_t moment) {
+  // Proximity's counts are whole numbers, 0 instead of none; only its offsets are not.
+  if (moment == kAfter || mode.family == "prox" || mode.family == "prox with offset") return {};
+  if (computesPulses(mode) && moment == kMiddle) return {};
+  // These show what they get.
+  if (mode.ending == Ending::kShown || mode.Is("als under the display sample") ||
+      mode.Is("prox under the display sample") || mode.Is("prox under the display offset, automatic")) {
+    return {};
+  }
+  // Without an infrared that is a number a reading of colors does not count, and what is no temperature is
+  // none.
+  if (mode.family == "color" || (isThermometer(mode) && mode.family == "imu-thermal"))
+    return lost(mode, moment);
+  if (computesPulses(mode)) return {ssc::kInvalid, "nothing to scale"};
+  if (mode.Is("prox under the display offset")) return {ssc::kInvalid, "cannot be stored"};
+  // Its pose, or its steady rotation, is looked for in what is no number.
+  const bool isSought = mode.device == "p2m2" && mode.struck.empty() && !mode.Is("imu-multipoint turn");
+  return {ssc::kInvalid, isSought ? "nan" : "finite"};
+}
+
 using ReadingExpectation = Expected (*)(const CommandMode& mode, std::size_t moment);
 
 }  // namespace
@@ -27,27 +55,25 @@ void addReadingRows(std::vector<FaultRow>* rows) {
       {"low_accuracy",
        {},
        [](const CommandMode& mode, std::size_t moment) {
-         return mode.family == "baro" ? Expected{} : lost(mode, moment);
+         return countsInaccurate(mode) ? Expected{} : lost(mode, moment);
        }},
       {"short_event",
        {"values=0"},
        [](const CommandMode& mode, std::size_t moment) {
+         if (takesRawValues(mode) && moment == kFirst)
+           return Expected{ssc::kNoData, "raw data not available"};
          const bool isMalformed = measuresOffsets(mode) && moment != kAfter;
          return isMalformed ? collectionFails(mode, ssc::kMalformed, "Received malformed")
                             : lost(mode, moment);
        }},
-      {"extra_values", {"values=3"}, [](const CommandMode&, std::size_t) { return Expected{}; }},
-      {"nan",
-       {},
+      {"extra_values",
+       {"values=3"},
        [](const CommandMode& mode, std::size_t moment) {
-         // Proximity's counts are whole numbers, 0 instead of none; only its offsets are not.
-         if (moment == kAfter || mode.family == "prox" || mode.family == "prox with offset")
-           return Expected{};
-         if (mode.Is("als under the display sample")) return Expected{};  // it shows what it gets
-         if (measuresPulses(mode) && moment == kMiddle) return Expected{};
-         // Without an infrared that is a number a reading of colors does not count.
-         return mode.family == "color" ? lost(mode, moment) : Expected{ssc::kInvalid, ""};
+         // A record has room for one temperature.
+         const bool isRecorded = isThermometer(mode) && mode.device == "p2m2" && moment == kFirst;
+         return isRecorded ? Expected{ssc::kInvalid, "has invalid dimension"} : Expected{};
        }},
+      {"nan", {}, notANumber},
       {"malformed",
        {},
        [](const CommandMode& mode, std::size_t moment) {
@@ -65,6 +91,7 @@ void addReadingRows(std::vector<FaultRow>* rows) {
       FaultRow row;
       row.family = "Readings";
       row.name = std::string(kind.fault) + ", " + moments()[moment].name;
+      row.strikes = Strikes::kSensor;
       row.overrides = [kind, moment](const CommandMode& mode, const Traffic& good) -> Made {
         if (mode.streamed.empty() || good.readings.empty()) return std::nullopt;
         std::vector<std::string> keys = kind.keys;

@@ -33,7 +33,7 @@ std::vector<std::string> whenStoring(const CommandMode& mode, const std::string&
 Expected itemOfAnotherKind(const CommandMode& mode) {
   // Light and proximity take it for 0, the phases' result and a reset replace it: that is how it is repaired.
   const bool isReplaced =
-      counts(mode) || mode.family == "sar" || mode.name == "reset" || mode.Is("imu-multipoint last phase");
+      counts(mode) || mode.family == "sar" || mode.name == "reset" || mode.device == "p2m2";
   return isReplaced ? Expected{} : Expected{ssc::kInvalid, "Invalid registry"};
 }
 

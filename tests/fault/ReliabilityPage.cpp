@@ -16,14 +16,17 @@ std::string cellText(const std::optional<FaultCell>& cell) {
                           : std::to_string(cell->result);
 }
 
-/// The modes of one command, by their index.
+/// The modes of one table, by their index: those of one command, or those with another sensor struck.
 using Columns = std::vector<std::size_t>;
 
 std::vector<Columns> columnsByFamily() {
   std::vector<Columns> families;
   const auto& modes = commandModes();
   for (std::size_t i = 0; i < modes.size(); ++i) {
-    if (i == 0 || modes[i].family != modes[i - 1].family) families.emplace_back();
+    if (i == 0 || modes[i].family != modes[i - 1].family ||
+        modes[i].struck.empty() != modes[i - 1].struck.empty()) {
+      families.emplace_back();
+    }
     families.back().push_back(i);
   }
   return families;
@@ -33,10 +36,13 @@ std::string tableOf(const Columns& columns, const std::vector<ModeResults>& mode
   std::string head = "| |";
   std::string rule = "|---|";
   for (const std::size_t column : columns) {
-    head += " " + commandModes()[column].name + " |";
+    const CommandMode& mode = commandModes()[column];
+    head += " " + mode.name + (mode.struck.empty() ? "" : ": " + mode.struck) + " |";
     rule += "---:|";
   }
-  std::string table = "### " + commandModes()[columns.front()].family + "\n\n" + head + "\n" + rule + "\n";
+  const CommandMode& first = commandModes()[columns.front()];
+  std::string table = "### " + first.family + (first.struck.empty() ? "" : ": another sensor is struck") +
+                      "\n\n" + head + "\n" + rule + "\n";
   std::string family;
   for (std::size_t row = 0; row < faultRows().size(); ++row) {
     const bool possible = std::any_of(columns.begin(), columns.end(), [&](std::size_t column) {

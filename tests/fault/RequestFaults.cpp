@@ -15,19 +15,24 @@ enum class Failure {
   kError,       ///< taken, and answered by an error event
 };
 
+/// When it is sent. What fails in the look-up fails before anything has changed.
+enum class Stage { kLookUp, kMeasuring, kStoring };
+
 struct Request {
   const char* name;
+  Strikes strikes;
+  Stage stage;
   /// Whom it goes to, in this mode; nobody: this mode has no such request.
   std::string (*addressee)(const CommandMode&);
   std::uint32_t message;
   std::size_t after;  ///< so many of its kind go well
-  Stored stored;
   Expected (*expected)(const CommandMode&, Failure);
 };
 
 std::string lookUp(const CommandMode&) { return "suid"; }
 std::string lookedUp(const CommandMode& mode) { return mode.lookedUp; }
 std::string streamed(const CommandMode& mode) { return mode.streamed; }
+std::string told(const CommandMode& mode) { return mode.streamed.empty() ? mode.lookedUp : mode.streamed; }
 std::string registry(const CommandMode&) { return ssc::kRegistryDataType; }
 
 int resultOf(Failure failure) { return failure == Failure::kUnanswered ? ssc::kTimedOut : ssc::kIoError; }
@@ -35,8 +40,12 @@ int resultOf(Failure failure) { return failure == Failure::kUnanswered ? ssc::kT
 Expected lookUpFails(const CommandMode&, Failure failure) { return {resultOf(failure), "Unable to"}; }
 
 Expected attributesFail(const CommandMode& mode, Failure failure) {
-  // A SAR sensor that does not say which one it is cannot be the one wanted.
-  return {mode.family == "sar" ? ssc::kNotFound : resultOf(failure), "Unable to"};
+  // Of the first sensor of a chip all depends. Of the others, and of SAR sensors, one that does not say which
+  // one it is cannot be the one wanted.
+  const bool isFirst = mode.struck.empty() || mode.lookedUp == "accel" || mode.lookedUp == "mag" ||
+                       mode.lookedUp == "pressure";
+  if (isFirst && mode.family != "sar") return {resultOf(failure), "Unable to"};
+  return {ssc::kNotFound, "Unable to read the attributes of"};
 }
 
 /// The hub answers a read with an error for the one reason that there is no such group.
@@ -56,14 +65,29 @@ Expected startFails(const CommandMode& mode, Failure failure) {
 
 Expected stopFails(const CommandMode&, Failure) { return {}; }
 
+/// It writes first of all that the scale is neutral, and measures then.
+constexpr const char* kScaledBefore = "als under the display record and solve again";
+constexpr const char* kNotNeutral = "Unable to make the sensor measure without its scale";
+
 Expected writeFails(const CommandMode& mode, Failure failure) {
+  if (mode.Is(kScaledBefore)) return {resultOf(failure), kNotNeutral};
   // No more than that it failed: the lines of a light calibration are fixed.
   if (mode.Is("als calibrate")) return {resultOf(failure), "ALS calibration failed.", Reason::kUnsaid};
   return {resultOf(failure), "Failed to write"};
 }
 
+Expected writeFailsAgain(const CommandMode& mode, Failure failure) {
+  return {resultOf(failure), mode.Is(kScaledBefore) ? "Failed to write" : writeFails(mode, failure).says};
+}
+
 /// The calibration stays; it takes effect at the next start.
-Expected noticeFails(const CommandMode&, Failure) { return {ssc::kOk, "Unable to notify sensor"}; }
+Expected noticeFails(const CommandMode& mode, Failure failure) {
+  // Without it the sensor would be measured with the scale that has just been made neutral.
+  if (mode.Is(kScaledBefore)) {
+    return {failure == Failure::kRefused ? ssc::kIoError : ssc::kTimedOut, kNotNeutral};
+  }
+  return {ssc::kOk, "Unable to notify sensor"};
+}
 
 /// Whether it could be sent counts, and nothing else.
 Expected testFails(const CommandMode& mode, Failure failure) {
@@ -81,16 +105,23 @@ constexpr std::uint32_t kOwnRequest = 0;
 
 const std::vector<Request>& requests() {
   static const std::vector<Request> all{
-      {"look-up of the sensor", lookUp, ssc::kSuidRequest, 0, Stored::kNothing, lookUpFails},
-      {"the sensor's attributes", lookedUp, ssc::kAttributesRequest, 0, Stored::kNothing, attributesFail},
-      {"reading the registry", registry, ssc::kRegistryReadRequest, 0, Stored::kNothing, readFails},
-      {"starting the sensor", streamed, ssc::kStreamConfigRequest, 0, Stored::kNothing, startFails},
-      {"stopping the sensor", streamed, ssc::kDisableRequest, 0, Stored::kNothing, stopFails},
-      {"writing the registry", registry, ssc::kRegistryWriteRequest, 0, Stored::kPerhaps, writeFails},
-      {"writing it a second time", registry, ssc::kRegistryWriteRequest, 1, Stored::kPerhaps, writeFails},
-      {"telling the sensor", streamed, ssc::kCalibrationChangedRequest, 0, Stored::kPerhaps, noticeFails},
-      {"the factory test", lookedUp, ssc::kTestRequest, 0, Stored::kPerhaps, testFails},
-      {"its own request", lookedUp, kOwnRequest, 0, Stored::kNothing, ownRequestFails},
+      {"look-up of the sensor", Strikes::kCommand, Stage::kLookUp, lookUp, ssc::kSuidRequest, 0, lookUpFails},
+      {"the sensor's attributes", Strikes::kSensor, Stage::kLookUp, lookedUp, ssc::kAttributesRequest, 0,
+       attributesFail},
+      {"reading the registry", Strikes::kCommand, Stage::kMeasuring, registry, ssc::kRegistryReadRequest, 0,
+       readFails},
+      {"starting the sensor", Strikes::kSensor, Stage::kMeasuring, streamed, ssc::kStreamConfigRequest, 0,
+       startFails},
+      {"stopping the sensor", Strikes::kSensor, Stage::kMeasuring, streamed, ssc::kDisableRequest, 0,
+       stopFails},
+      {"writing the registry", Strikes::kCommand, Stage::kStoring, registry, ssc::kRegistryWriteRequest, 0,
+       writeFails},
+      {"writing it a second time", Strikes::kCommand, Stage::kStoring, registry, ssc::kRegistryWriteRequest,
+       1, writeFailsAgain},
+      {"telling the sensor", Strikes::kSensor, Stage::kStoring, told, ssc::kCalibrationChangedRequest, 0,
+       noticeFails},
+      {"the factory test", Strikes::kCommand, Stage::kStoring, lookedUp, ssc::kTestRequest, 0, testFails},
+      {"its own request", Strikes::kCommand, Stage::kMeasuring, lookedUp, kOwnRequest, 0, ownRequestFails},
   };
   return all;
 }
@@ -129,7 +160,9 @@ void addRequestRows(std::vector<FaultRow>* rows) {
       row.expected = [request, kind](const CommandMode& mode) {
         return kind.failure ? request.expected(mode, *kind.failure) : Expected{};
       };
-      row.stored = request.stored;
+      row.strikes = request.strikes;
+      row.mayHaveBegun = request.stage != Stage::kLookUp;
+      row.stored = request.stage == Stage::kStoring ? Stored::kPerhaps : Stored::kNothing;
       rows->push_back(row);
     }
   }
@@ -138,11 +171,14 @@ void addRequestRows(std::vector<FaultRow>* rows) {
 void addAnswerRows(std::vector<FaultRow>* rows) {
   rows->push_back({"Requests", "no such sensor",
                    [](const CommandMode& mode, const Traffic&) -> Made {
+                     if (mode.lookedUp.empty()) return std::nullopt;
                      return faultOf("absent", {"sensor=" + mode.lookedUp});
                    },
                    [](const CommandMode&) {
                      return Expected{ssc::kNotFound, "Unable to"};
                    }});
+  rows->back().strikes = Strikes::kSensor;
+  rows->back().mayHaveBegun = false;
   rows->push_back({"Requests", "no registry",
                    [](const CommandMode&, const Traffic& good) -> Made {
                      if (good.CountRequests("registry", ssc::kRegistryReadRequest) == 0) return std::nullopt;
@@ -157,11 +193,11 @@ void addAnswerRows(std::vector<FaultRow>* rows) {
       return faultOf(fault, {"sensor=" + mode.lookedUp, "message=" + std::to_string(mode.ownRequest)});
     };
   };
-  rows->push_back(
-      {"Requests", "its own request is answered with a failure", ownRequestFault("oem_failure"),
-       [](const CommandMode& mode) {
-         return mode.family == "sar" ? Expected{ssc::kMalformed, "malformed"} : Expected{ssc::kOk, "ERROR: "};
-       }});
+  rows->push_back({"Requests", "its own request is answered with a failure", ownRequestFault("oem_failure"),
+                   [](const CommandMode& mode) {
+                     if (mode.family == "sar") return Expected{ssc::kMalformed, "malformed"};
+                     return Expected{ssc::kOk, "ERROR: ", Reason::kSaid, Success::kUnclaimed};
+                   }});
   rows->push_back({"Requests", "its own request is answered with nonsense", ownRequestFault("oem_malformed"),
                    [](const CommandMode&) {
                      return Expected{ssc::kMalformed, "malformed"};
@@ -172,12 +208,14 @@ void addAnswerRows(std::vector<FaultRow>* rows) {
        }});
   rows->push_back({"Requests", "the sensor does not confirm",
                    [](const CommandMode& mode, const Traffic& good) -> Made {
-                     if (good.CountRequests(mode.streamed, ssc::kCalibrationChangedRequest) == 0)
+                     const std::string sensor = told(mode);
+                     if (sensor.empty() || good.CountRequests(sensor, ssc::kCalibrationChangedRequest) == 0)
                        return std::nullopt;
-                     return faultOf("no_notification", {"sensor=" + mode.streamed});
+                     return faultOf("no_notification", {"sensor=" + sensor});
                    },
                    [](const CommandMode& mode) { return noticeFails(mode, Failure::kUnanswered); },
                    Stored::kPerhaps});
+  rows->back().strikes = Strikes::kSensor;
 }
 
 Expected groupUnreadable(const CommandMode& mode) { return readFails(mode, Failure::kError); }
