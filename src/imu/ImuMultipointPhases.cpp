@@ -145,12 +145,12 @@ SampleData ImuMultipointCalibrator::measureSteadyRate() const {
     ssc::log(ssc::kLogError,
              "Heavy fluctuation detected on gyro data during steady rotating phase, please check if rotation "
              "station is functioning properly");
-    ssc::log(ssc::kLogWarn, "The rates about the %c-axis differ by %f rad/s, more than %f rad/s",
+    ssc::log(ssc::kLogDebug, "The rates about the %c-axis differ by %f rad/s, more than %f rad/s",
              axisLetter(steady.axis), static_cast<double>(steady.fluctuation),
              static_cast<double>(steady.allowedFluctuation));
   } else if (steady.fault == SteadyRate::Fault::kNoSamples) {
     ssc::log(
-        ssc::kLogWarn,
+        ssc::kLogDebug,
         "None of %zu gyro samples is of a steady rotation: their mean rate about the %c-axis is %f rad/s",
         collected->second.size(), axisLetter(steady.axis),
         static_cast<double>(withPlainNan(steady.meanRate)));

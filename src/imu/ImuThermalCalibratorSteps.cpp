@@ -131,7 +131,7 @@ int ImuThermalCalibrator::CorrelateTemperature(const ssc::SensorUid& sensor,
   constexpr std::size_t kNeeded = 2;
   if (itsTemperatures.size() < kNeeded) {
     ssc::log(ssc::kLogError, "Insufficient data to perform linear regression");
-    ssc::log(ssc::kLogWarn, "Only %zu of at least %zu %s samples lie within the time of %zu %s samples",
+    ssc::log(ssc::kLogDebug, "Only %zu of at least %zu %s samples lie within the time of %zu %s samples",
              itsTemperatures.size(), kNeeded, info.name.c_str(), samples[temperature].size(),
              sensorInfo[temperature].name.c_str());
     return ssc::kNoData;
