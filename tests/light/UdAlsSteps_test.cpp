@@ -325,21 +325,6 @@ TEST_F(UdAlsSteps, AVerificationWaitsForSoManySamplesAsASoundSensorBrings) {
   EXPECT_THAT(captured.out, EndsWith("Collecting samples...\nVerification failed.\n"));
 }
 
-TEST_F(UdAlsSteps, AStepWithAToleranceIsTakenWithoutMeansAndAdvice) {
-  globals.quiet = false;
-  const Captured taken = run({"-s", "2", "-v", "5", "white", "100"});
-  EXPECT_EQ(taken.result, 0);
-  EXPECT_EQ(taken.out,
-            "Searching for ambient light sensor...\nDisplay pattern noise calibration...\n"
-            "Collecting samples...\nSaving data to file...\n");
-  EXPECT_EQ(records().size(), 1U);
-
-  script->sensors[0].reading = nullptr;
-  const Captured silent = run({"-s", "2", "-v", "5", "white", "100"});
-  EXPECT_EQ(silent.result, -110);
-  EXPECT_THAT(silent.out, EndsWith("Collecting samples...\n"));
-}
-
 TEST_F(UdAlsSteps, AStepWaitsLonger) {
   script->sensors[0].reading = nullptr;
   const Captured captured = run({"-s", "11", "100"});
